@@ -1,0 +1,75 @@
+// A compiled kernel, the per-device map that owns all of them, and the launch of one kernel.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <map>
+#include <memory>
+#include <string>
+#include <type_traits>
+
+#include "zor/buffer.h"
+#include "zor/device_cl.h"
+
+namespace zor {
+
+inline constexpr uint32_t kMaxLaunchArguments = 64;
+inline constexpr size_t kMaxArgumentBytes = 64;
+
+class Kernel {
+ public:
+    Kernel(KernelHandle kernel, std::string name) : kernel_(std::move(kernel)), name_(std::move(name)) {}
+
+    uint32_t kind() const noexcept { return DEVICE_KIND_CL; }
+    cl_kernel handle() const noexcept { return kernel_.get(); }
+    const std::string& name() const noexcept { return name_; }
+
+ private:
+    KernelHandle kernel_;
+    std::string name_;
+};
+
+// Key text to kernel. Nothing is evicted while the device lives.
+class KernelManager {
+ public:
+    Kernel* find(const std::string& mapName) const;
+    Kernel* insert(std::string mapName, std::unique_ptr<Kernel> kernel);
+    void remove(const std::string& mapName);
+    size_t size() const noexcept { return kernels_.size(); }
+
+ private:
+    std::map<std::string, std::unique_ptr<Kernel>> kernels_;
+};
+
+// Binds arguments by position and launches once. Every failure is a broken invariant.
+class Launcher {
+ public:
+    // The device must be an OpenCL device.
+    Launcher(Device& device, Kernel& kernel);
+
+    // The next argument, by value: numbers, float2 pairs, matrices.
+    template <class Value>
+    void arg(const Value& value) {
+        static_assert(std::is_trivially_copyable_v<Value> && !std::is_pointer_v<Value>);
+        static_assert(sizeof(Value) <= kMaxArgumentBytes);
+        setNext(&value, sizeof value);
+    }
+    // The next argument: a buffer's memory object.
+    void arg(const BufferBase& buffer);
+
+    uint32_t argumentCount() const noexcept { return next_; }
+
+    // Local sizes are clamped to 1 ... the device's limits, the global size rounded up to whole groups (at least one).
+    // Returns when the kernel has run.
+    void launch1D(int32_t globalSize, int32_t localSize);
+    void launch2D(int32_t globalX, int32_t globalY, int32_t localX, int32_t localY);
+
+ private:
+    void setNext(const void* value, size_t size);
+
+    DeviceCL& device_;
+    Kernel& kernel_;
+    uint32_t next_ = 0;
+};
+
+}  // namespace zor
