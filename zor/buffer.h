@@ -1,10 +1,11 @@
 // Byte buffers on a device, allocated under the device's memory budget.
 #pragma once
 
+#include "zor/device.h"
+
 #include <cstddef>
 #include <cstdint>
-
-#include "zor/device.h"
+#include <memory>
 
 namespace zor {
 
@@ -27,10 +28,10 @@ class BufferBase {
     virtual ~BufferBase();
 
     Device& device() const noexcept;
-    uint64_t size() const noexcept;       // bytes; 0 when empty
-    cl_mem memory() const noexcept;       // null when empty or on a host device
-    void* hostMemory() const noexcept;    // host device only
-    bool hasMemory() const noexcept;      // either of the two
+    uint64_t size() const noexcept;     // bytes; 0 when empty
+    cl_mem memory() const noexcept;     // null when empty or on a host device
+    void* hostMemory() const noexcept;  // host device only
+    bool hasMemory() const noexcept;    // either of the two
 
     // Puts a foreign memory object into an empty buffer (BUFFER_NO_ALLOCATION). Its bytes are never counted against
     // the budget; with owned set the buffer releases the object when it dies.
@@ -45,7 +46,22 @@ class BufferBase {
     // both where the OpenCL library has no clEnqueueCopyBuffer.
     void copyFrom(const BufferBase& other, uint64_t bytes);
 
-    // private members are the implementation's
+ private:
+    struct PagesDeleter {
+        void operator()(std::byte* pages) const noexcept;
+    };
+    using Pages = std::unique_ptr<std::byte, PagesDeleter>;
+
+    void allocateOnDevice(BufferKind kind);
+    void allocateOnHost();
+    void copyThroughHost(const BufferBase& other, uint64_t bytes);
+
+    Device& device_;
+    uint64_t size_;
+    uint64_t counted_ = 0;  // bytes of the device's budget that this buffer holds
+    Pages host_;            // a host device's memory, or the block behind a buffer of exactly the maximum size
+    cl_mem memory_ = nullptr;
+    MemoryHandle owned_;  // dies before the host block that it may lie on
 };
 
 template <class Element>

@@ -34,7 +34,7 @@ inline constexpr uint32_t kAllVendors = 0xFFFFFFFFu;
 inline constexpr size_t kDeviceTextBytes = 128;  // capacity of the buffers that the text queries fill
 
 struct DeviceConfig {
-    uint32_t deviceType = 0;  // 0: GPU devices; anything else: CPU devices
+    uint32_t deviceType = 0;   // 0: GPU devices; anything else: CPU devices
     uint32_t deviceIndex = 0;  // used as signed; beyond the last device means the last one
     uint32_t vendorMask = kAllVendors;
     const cl_context_properties* contextProperties = nullptr;  // key/value pairs ended by a zero key
@@ -47,12 +47,12 @@ struct EventHolder {
 
 // What a kernel is looked up by. The views must live for the call only.
 struct KernelRequest {
-    std::string_view fileName;                         // nominal source file, without ".cl"
+    std::string_view fileName;  // nominal source file, without ".cl"
     std::string_view kernelName;
-    std::optional<std::string_view> options;           // compiler options
-    std::span<const std::string_view> sources;         // source texts; none: read fileName + ".cl" from disk
-    std::span<const std::string_view> dependencies;    // files that a cached binary must be newer than
-    bool keepInCache = true;                           // may reuse the map's kernel and the cached binary
+    std::optional<std::string_view> options;         // compiler options
+    std::span<const std::string_view> sources;       // source texts; none: read fileName + ".cl" from disk
+    std::span<const std::string_view> dependencies;  // files that a cached binary must be newer than
+    bool keepInCache = true;                         // may reuse the map's kernel and the cached binary
 };
 
 // All text operations write at most kDeviceTextBytes bytes, zero-terminated.

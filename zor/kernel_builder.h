@@ -3,6 +3,7 @@
 #pragma once
 
 #include <cstdint>
+#include <optional>
 #include <span>
 #include <string>
 #include <string_view>
@@ -20,12 +21,13 @@ const char* cacheDirectory() noexcept;
 uint32_t oneAtATimeHash(std::string_view text, uint32_t seed) noexcept;
 
 // "directory/base-hash.v.version.device.driver_64.bin"; an absent option text gives "0x0" as hash.
-std::string binaryFileName(const DeviceCL& device, std::string_view fileName,
-                           std::optional<std::string_view> options);
+std::string binaryFileName(const DeviceCL& device, std::string_view fileName, std::optional<std::string_view> options);
 
 // The binary exists and is newer than the source, or there is no source. Prints a line for a file that cannot be
 // opened.
 bool isFileUpToDate(const std::string& binary, const std::string& source);
+
+struct CacheEntry;
 
 class KernelBuilder {
  public:
@@ -42,6 +44,11 @@ class KernelBuilder {
     cl_program program() const noexcept { return program_.get(); }
 
  private:
+    bool load(const CacheEntry& entry);
+    void compile(std::span<const std::string_view> sources, const std::string& options);
+    void store(const CacheEntry& entry) const;
+    void reportBuildFailure(cl_program program, int32_t status) const;
+
     DeviceCL& device_;
     ProgramHandle program_;
 };

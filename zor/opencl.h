@@ -4,6 +4,9 @@
 #ifndef CL_TARGET_OPENCL_VERSION
 #define CL_TARGET_OPENCL_VERSION 120
 #endif
+#ifndef CL_USE_DEPRECATED_OPENCL_1_1_APIS
+#define CL_USE_DEPRECATED_OPENCL_1_1_APIS  // clGetExtensionFunctionAddress
+#endif
 #include <CL/cl.h>
 #include <CL/cl_gl.h>
 
@@ -18,7 +21,7 @@ namespace zor {
 template <class Function>
 class EntryPoint {
  public:
-    EntryPoint(const char* name) noexcept : name_(name) {}
+    constexpr explicit EntryPoint(const char* name) noexcept : name_(name) {}
 
     template <class... Arguments>
     auto operator()(Arguments... arguments) const {
@@ -49,6 +52,13 @@ int32_t loadOpenCL();
 
 // Forgets the library and its entry points. It stays mapped: the driver's threads may still be running in it.
 void unloadOpenCL() noexcept;
+
+// References taken by isDeviceKindAvailable since the library was loaded; the number only grows.
+uint32_t openCLReferences() noexcept;
+void addOpenCLReference() noexcept;
+
+// clGetGLContextInfoKHR, asked of the driver once per loaded library and kept; null where it has none.
+clGetGLContextInfoKHR_fn glContextInfo();
 
 // "CL_SUCCESS" ... for 0 ... -68, "" for the codes -20 ... -29 that OpenCL does not assign, and for -1001 the name of
 // the loader's own code; "Unknown OpenCL error" for anything else.
