@@ -1,0 +1,141 @@
+// CLI11's options turned into commands.
+#include "arguments.h"
+
+#include <CLI/App.hpp>
+#include <CLI/Config.hpp>
+#include <CLI/Formatter.hpp>
+#include <algorithm>
+
+#include "failure.h"
+#include "filter_names.h"
+#include "text.h"
+#include "tov/tov.h"
+
+namespace tool {
+
+namespace {
+
+constexpr const char* kVersion = "tov " TOV_VERSION_STRING;
+constexpr const char* kDescription = "Filters rendered pictures on an OpenCL device.";
+
+constexpr const char* kMainFooter =
+    "Examples:\n"
+    "  tov devices\n"
+    "  tov filters reinhard_tonemap\n"
+    "  tov run render.exr -f reinhard_tonemap -f gamma_correction:cGamma=2.2 -o picture.png\n"
+    "\n"
+    "Exit status: 0 done; 1 the library or the device failed; 2 wrong arguments, names or values;\n"
+    "3 no such device; 4 a picture cannot be read; 5 a result cannot be written.\n"
+    "\n"
+    "Results go to standard output, everything else to standard error.";
+
+constexpr const char* kRunFooter =
+    "Stages run in the order given. `tov filters` lists their names and parameters.\n"
+    "\n"
+    "Values are worked on and written as they are stored: no colour management. A linear render needs a\n"
+    "gamma_correction stage before it looks right in an 8-bit format. Pictures of 8 bits are 0 ... 1 while they are\n"
+    "worked on. OpenEXR is written as half or float like the input, TIFF and Radiance HDR as float, everything else\n"
+    "with 8 bits, clamped and rounded. The output is written whole or not at all.\n"
+    "\n"
+    "drago_tonemap measures avLum and maxLum on its input where they are not given.\n"
+    "Colour spaces have names: color_space:srcColorSpace=srgb,dstColorSpace=rec2020.\n"
+    "\n"
+    "Examples:\n"
+    "  tov run render.exr -f reinhard_tonemap:cKey=0.5 -f gamma_correction:cGamma=2.2 -o picture.png\n"
+    "  tov run render.exr -f drago_tonemap:cBias=0.85 -f gamma_correction:cGamma=2.2 -o picture.jpg\n"
+    "  tov run wide.exr -f color_space:srcColorSpace=rec2020,dstColorSpace=srgb -o narrow.exr --device cpu";
+
+// What CLI11 fills in before it is judged.
+struct RawArguments {
+    std::string filter;
+    bool markdown = false;
+    std::string input;
+    std::vector<std::string> stages;
+    std::string output;
+    std::string device;
+    std::string cache;
+    bool verbose = false;
+};
+
+void addFilters(CLI::App& app, RawArguments& raw) {
+    CLI::App* const filters = app.add_subcommand("filters", "List filters with their parameters and defaults");
+    filters->add_option("NAME", raw.filter, "Only this filter");
+    filters->add_flag("--markdown", raw.markdown, "Print Markdown");
+}
+
+void addRun(CLI::App& app, RawArguments& raw) {
+    CLI::App* const run = app.add_subcommand("run", "Filter a picture");
+    run->add_option("INPUT", raw.input, "Picture: EXR, HDR, TIFF, PNG, JPEG ...")->required();
+    run->add_option("-f,--filter", raw.stages, "Filter with its parameters: NAME[:param=value[,param=value...]]")
+        ->required()
+        ->expected(1)
+        ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll)
+        ->type_name("STAGE");
+    run->add_option("-o,--output", raw.output, "Picture to write; its extension tells the format")
+        ->required()
+        ->type_name("FILE");
+    run->add_option("--device", raw.device, "gpu, cpu, gpu:INDEX or cpu:INDEX (default: the first GPU, else CPU)")
+        ->type_name("DEVICE");
+    run->add_option("--cache", raw.cache, "Directory for compiled kernels (default: tov in your cache directory)")
+        ->type_name("DIR");
+    run->add_flag("--verbose", raw.verbose, "Tell what is done, and show the library's own lines");
+    run->footer(kRunFooter);
+}
+
+// CLI11 would only say that a name was not expected.
+void refuseUnknownCommand(const CLI::App& app, int argc, const char* const* argv) {
+    if (argc < 2 || argv[1][0] == '-') return;
+    std::vector<std::string> names;
+    for (const CLI::App* const command : app.get_subcommands({})) names.push_back(command->get_name());
+    if (std::ranges::find(names, argv[1]) != names.end()) return;
+    throw usageFailure("there is no command \"" + std::string(argv[1]) + "\"" + suggestion(argv[1], names) +
+                       "; the commands are " + join(names, ", "));
+}
+
+RunCommand makeRun(const CLI::App& run, const RawArguments& raw) {
+    RunCommand command{raw.input, {}, raw.output, std::nullopt, std::nullopt, raw.verbose};
+    if (command.input.empty()) throw usageFailure("INPUT is empty");
+    if (command.output.empty()) throw usageFailure("--output is empty");
+    for (const std::string& text : raw.stages) {
+        command.stages.push_back(parseStage(text));
+        filterType(command.stages.back().filter);
+    }
+    if (run.count("--device") > 0) command.device = parseDevice(raw.device);
+    if (run.count("--cache") > 0) command.cache = raw.cache;
+    return command;
+}
+
+FiltersCommand makeFilters(const CLI::App& filters, const RawArguments& raw) {
+    if (filters.count("NAME") == 0) return {std::nullopt, raw.markdown};
+    filterType(raw.filter);
+    return {raw.filter, raw.markdown};
+}
+
+}  // namespace
+
+Command parseArguments(int argc, const char* const* argv) {
+    CLI::App app(kDescription, "tov");
+    RawArguments raw;
+    app.add_subcommand("devices", "List the OpenCL devices");
+    addFilters(app, raw);
+    addRun(app, raw);
+    app.require_subcommand(1);
+    app.footer(kMainFooter);
+    app.set_version_flag("--version", kVersion);
+    for (CLI::App* const command : app.get_subcommands({})) command->set_version_flag("--version", kVersion);
+    refuseUnknownCommand(app, argc, argv);
+    try {
+        app.parse(argc, argv);
+    } catch (const CLI::CallForHelp&) {
+        return PrintCommand{app.help()};
+    } catch (const CLI::CallForVersion&) {
+        return PrintCommand{std::string(kVersion) + "\n"};
+    } catch (const CLI::ParseError& error) {
+        throw usageFailure(std::string(error.what()) + "; see tov --help");
+    }
+    if (app.got_subcommand("run")) return makeRun(*app.get_subcommand("run"), raw);
+    if (app.got_subcommand("filters")) return makeFilters(*app.get_subcommand("filters"), raw);
+    return DevicesCommand{};
+}
+
+}  // namespace tool

@@ -1,0 +1,81 @@
+// tov: the command-line host of the library.
+#include <new>
+#include <string>
+#include <variant>
+
+#include "arguments.h"
+#include "devices.h"
+#include "failure.h"
+#include "filter_listing.h"
+#include "picture_reader.h"
+#include "picture_writer.h"
+#include "pipeline.h"
+#include "streams.h"
+#include "user_directories.h"
+
+namespace tool {
+
+namespace {
+
+void execute(Streams& streams, const PrintCommand& command) {
+    streams.result(command.text);
+}
+
+void execute(Streams& streams, const DevicesCommand& /*command*/) {
+    streams.result(listDevices());
+}
+
+void execute(Streams& streams, const FiltersCommand& command) {
+    const Handle context = openDevice(chooseDevice(std::nullopt), nullptr);
+    streams.result(listFilters(context.get(), command.filter, command.markdown));
+}
+
+// Whatever can be found wrong is found before the first pixel is worked on.
+void execute(Streams& streams, const RunCommand& command) {
+    streams.setVerbose(command.verbose);
+    PictureWriter writer(command.output);
+    const std::string cache = cacheDirectory(command.cache);
+    const DeviceChoice device = chooseDevice(command.device);
+    const Handle context = openDevice(device, cache.c_str());
+    const std::vector<PreparedStage> stages = prepareStages(context.get(), command.stages);
+    Picture picture = readPicture(command.input);
+    if (command.verbose) {
+        note("device " + deviceName(device) + ": " + describeDevice(context.get()));
+        note("compiled kernels are kept in " + cache);
+        note(command.input + ": " + std::to_string(picture.width) + " x " + std::to_string(picture.height) +
+             " pixels, " + std::to_string(picture.channels.size()) + " channels");
+    }
+    runStages(streams, context.get(), stages, picture);
+    writer.write(picture);
+    if (command.verbose) note("wrote " + command.output);
+}
+
+ExitStatus runTool(Streams& streams, int argc, const char* const* argv) {
+    std::string message;
+    ExitStatus status = ExitStatus::kFailed;
+    try {
+        const Command command = parseArguments(argc, argv);
+        std::visit([&](const auto& chosen) { execute(streams, chosen); }, command);
+        streams.takeLibraryLines();
+        return ExitStatus::kDone;
+    } catch (const Failure& failure) {
+        message = failure.what();
+        status = failure.status();
+    } catch (const std::bad_alloc&) {
+        message = "the memory of this machine is not enough";
+    } catch (const std::exception& error) {
+        message = error.what();
+    }
+    if (status == ExitStatus::kFailed) streams.showLibraryLines();
+    complain(message);
+    return status;
+}
+
+}  // namespace
+
+}  // namespace tool
+
+int main(int argc, char** argv) {
+    tool::Streams streams;
+    return static_cast<int>(tool::runTool(streams, argc, argv));
+}

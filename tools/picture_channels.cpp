@@ -1,0 +1,92 @@
+// Channel names are LAYER.NAME or NAME alone, as in OpenEXR files.
+#include "picture_channels.h"
+
+#include <algorithm>
+#include <initializer_list>
+#include <string_view>
+
+namespace tool {
+
+namespace {
+
+struct ChannelName {
+    std::string layer;
+    std::string name;
+};
+
+ChannelName splitName(const std::string& channel) {
+    const size_t dot = channel.rfind('.');
+    if (dot == std::string::npos) return {"", channel};
+    return {channel.substr(0, dot), channel.substr(dot + 1)};
+}
+
+class Layers {
+ public:
+    explicit Layers(const std::vector<std::string>& channels) {
+        for (const std::string& channel : channels) {
+            channels_.push_back(splitName(channel));
+            const std::string& layer = channels_.back().layer;
+            if (std::ranges::find(layers_, layer) == layers_.end()) layers_.push_back(layer);
+        }
+    }
+
+    // The first layer that has all of the wanted names and none of the unwanted, with alpha if it has one.
+    std::optional<ChannelChoice> find(std::initializer_list<std::string_view> wanted,
+                                      std::initializer_list<std::string_view> unwanted) const {
+        for (const std::string& layer : layers_) {
+            const auto absent = [&](std::string_view name) { return index(layer, name) < 0; };
+            if (std::ranges::any_of(wanted, absent) || !std::ranges::all_of(unwanted, absent)) continue;
+            ChannelChoice choice;
+            for (const std::string_view name : wanted) add(choice, index(layer, name));
+            add(choice, index(layer, "A"));
+            return choice;
+        }
+        return std::nullopt;
+    }
+
+    // The only channel besides alpha, whatever it is called.
+    std::optional<ChannelChoice> findLone() const {
+        std::optional<ChannelChoice> choice;
+        for (size_t i = 0; i < channels_.size(); ++i) {
+            if (equal(channels_[i].name, "A") && channels_.size() > 1) continue;
+            if (choice) return std::nullopt;
+            add(choice.emplace(), static_cast<int>(i));
+        }
+        if (choice) add(*choice, channels_.size() > 1 ? index(channels_[0].layer, "A") : -1);
+        return choice;
+    }
+
+ private:
+    static bool equal(std::string_view a, std::string_view upper) {
+        const auto same = [](char x, char y) { return (x >= 'a' && x <= 'z' ? x - 'a' + 'A' : x) == y; };
+        return std::ranges::equal(a, upper, same);
+    }
+
+    int index(const std::string& layer, std::string_view name) const {
+        for (size_t i = 0; i < channels_.size(); ++i) {
+            if (channels_[i].layer == layer && equal(channels_[i].name, name)) return static_cast<int>(i);
+        }
+        return -1;
+    }
+
+    void add(ChannelChoice& choice, int channel) const {
+        if (channel < 0) return;
+        choice.indices.push_back(channel);
+        choice.names.push_back(channels_[static_cast<size_t>(channel)].name);
+    }
+
+    std::vector<ChannelName> channels_;
+    std::vector<std::string> layers_;
+};
+
+}  // namespace
+
+std::optional<ChannelChoice> chooseChannels(const std::vector<std::string>& fileChannels) {
+    const Layers layers(fileChannels);
+    if (auto colour = layers.find({"R", "G", "B"}, {})) return colour;
+    if (auto luminance = layers.find({"Y"}, {"X", "Z", "RY", "BY"})) return luminance;
+    if (auto lone = layers.findLone()) return lone;
+    return layers.find({"X", "Y", "Z"}, {});
+}
+
+}  // namespace tool
