@@ -1,0 +1,123 @@
+#include "core/image_checks.h"
+
+#include <limits>
+#include <string>
+
+#include "core/exception.h"
+#include "core/image_filter.h"
+
+namespace {
+
+constexpr uint32_t kMaxSide = std::numeric_limits<int32_t>::max();  // kernels take sizes as signed numbers
+
+// One image bound to one parameter.
+struct Binding {
+    TovFilterParameter* parameter;
+    uint32_t element;
+    const TovImage* image;
+    bool isOutput;
+};
+
+bool isOutput(const TovImageFilter& filter, const TovFilterParameter& parameter) {
+    if (std::string_view(parameter.name()) == "dstBuffer") return true;
+    for (const char* name : filter.spec().outputs)
+        if (std::string_view(parameter.name()) == name) return true;
+    return false;
+}
+
+std::vector<Binding> boundImages(const TovImageFilter& filter) {
+    std::vector<Binding> bindings;
+    for (TovFilterParameter* parameter : filter.imageParameters()) {
+        for (uint32_t i = 0; i < parameter->imageCount(); ++i)
+            if (const TovImage* image = parameter->boundImage(i))
+                bindings.push_back({parameter, i, image, isOutput(filter, *parameter)});
+    }
+    return bindings;
+}
+
+std::string sizeText(uint32_t width, uint32_t height) {
+    return std::to_string(width) + " x " + std::to_string(height);
+}
+
+[[noreturn]] void refuseImage(const Binding& binding, const std::string& why) {
+    std::string name = binding.parameter->name();
+    if (binding.parameter->type() == TOV_PARAMETER_TYPE_IMAGE_ARRAY)
+        name += "[" + std::to_string(binding.element) + "]";
+    refuse(TOV_ERROR_INVALID_OPERATION, name + " " + why);
+}
+
+void requireBound(TovImageFilter& filter, const char* name) {
+    if (filter.find(name)->boundObject() == nullptr)
+        refuse(TOV_ERROR_INVALID_OPERATION, std::string("No image is bound to ") + name);
+}
+
+void requireUsable(const Binding& binding, const TovImageFilter& filter) {
+    const TovImage& image = *binding.image;
+    const tov_image_desc& desc = image.desc();
+    if (image.device() != filter.device()) refuseImage(binding, "belongs to another context than the filter");
+    if (componentBytes(desc.type) == 0) refuseImage(binding, "has an unknown component type");
+    if (desc.num_components < 1 || desc.num_components > 4) refuseImage(binding, "must have 1 to 4 components");
+    if (image.width() > kMaxSide || image.height() > kMaxSide) refuseImage(binding, "is too wide or too high");
+    if (!image.hasStorage()) refuseImage(binding, "has no storage");
+    // Kernels address rows of exactly the width, so a smaller row pitch leaves the last rows without storage.
+    const uint64_t bytesPerPixel = uint64_t{desc.num_components} * componentBytes(desc.type);
+    if (!image.isOpenClImage() && image.pixelCount() > image.storage()->size() / bytesPerPixel)
+        refuseImage(binding, "has less storage than its pixels need (is the row pitch smaller than the width?)");
+}
+
+void requireSize(const Binding& binding, const TovImage& output, SizeRule rule) {
+    const TovImage& image = *binding.image;
+    if (rule == SizeRule::Unchecked) return;
+    if (rule == SizeRule::AnyInput && std::string_view(binding.parameter->name()) == "srcBuffer") return;
+    const bool covers = image.width() >= output.width() && image.height() >= output.height();
+    const bool equals = image.width() == output.width() && image.height() == output.height();
+    if (rule == SizeRule::EqualOutput ? equals : covers) return;
+    refuseImage(binding, "has " + sizeText(image.width(), image.height()) + " pixels, the output " +
+                             sizeText(output.width(), output.height()) +
+                             (rule == SizeRule::EqualOutput ? ": this filter needs equal sizes" : ""));
+}
+
+bool sameLayout(const TovImage& a, const TovImage& b) {
+    return a.storage()->memory() == b.storage()->memory() && a.width() == b.width() && a.desc().type == b.desc().type &&
+           a.desc().num_components == b.desc().num_components && a.isOpenClImage() == b.isOpenClImage();
+}
+
+}  // namespace
+
+void checkSizes(TovImageFilter& filter) {
+    for (const char* name : {"dstBufferSize", "srcBufferSize"}) {
+        const bool isBound = filter.find(name[0] == 'd' ? "dstBuffer" : "srcBuffer")->boundImage() != nullptr;
+        const Size size = filter.find(name)->asSize();
+        if (isBound && (size[0] == 0 || size[1] == 0))
+            refuse(TOV_ERROR_INVALID_PARAMETER,
+                   std::string("The ") + (name[0] == 'd' ? "output" : "input") + " has a width or height of 0");
+    }
+}
+
+void checkImages(TovImageFilter& filter) {
+    requireBound(filter, "srcBuffer");
+    requireBound(filter, "dstBuffer");
+    for (const char* name : filter.spec().required) requireBound(filter, name);
+    const std::vector<Binding> bindings = boundImages(filter);
+    const TovImage& output = *filter.find("dstBuffer")->boundImage();
+    for (const Binding& binding : bindings) requireUsable(binding, filter);
+    for (const Binding& binding : bindings) requireSize(binding, output, filter.spec().sizeRule);
+    for (const Binding& binding : bindings)
+        if (binding.isOutput && binding.image != &output && binding.image->sharesMemoryWith(output))
+            refuse(TOV_ERROR_INVALID_PARAMETER, "Two outputs of a filter must not share memory");
+}
+
+std::vector<AliasedInput> aliasedInputs(TovImageFilter& filter) {
+    std::vector<AliasedInput> aliased;
+    const std::vector<Binding> bindings = boundImages(filter);
+    for (const Binding& input : bindings) {
+        if (input.isOutput) continue;
+        for (const Binding& output : bindings) {
+            if (!output.isOutput || !input.image->sharesMemoryWith(*output.image)) continue;
+            if (filter.spec().inPlace == InPlace::PerPixel && sameLayout(*input.image, *output.image)) continue;
+            aliased.push_back({input.parameter, input.element, input.image});
+            break;
+        }
+    }
+    return aliased;
+}

@@ -1,0 +1,26 @@
+// What must hold of a filter's images when it runs: everything bound is looked at again, since images may have been
+// deleted, rebound or attached to another queue since they were checked.
+#pragma once
+
+#include <cstdint>
+#include <vector>
+
+class TovFilterParameter;
+class TovImage;
+class TovImageFilter;
+
+// The sizes that the filter works on are not 0: invalid parameter.
+void checkSizes(TovImageFilter& filter);
+
+// Every image is there where it must be, belongs to the filter's device, has a known layout, storage for all its
+// pixels and at least the size that the kernels address: invalid operation. Two outputs share no memory: invalid
+// parameter.
+void checkImages(TovImageFilter& filter);
+
+// An input whose memory the filter writes while it still needs it.
+struct AliasedInput {
+    TovFilterParameter* parameter;
+    uint32_t element;
+    const TovImage* image;
+};
+std::vector<AliasedInput> aliasedInputs(TovImageFilter& filter);

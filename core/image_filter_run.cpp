@@ -1,0 +1,138 @@
+// One run of a filter: checks, resources, passes.
+#include <algorithm>
+#include <array>
+
+#include "core/exception.h"
+#include "core/image_checks.h"
+#include "core/image_filter.h"
+#include "filters/value_checks.h"
+
+namespace {
+
+// OpenGL textures among input and output, acquired for OpenCL. Released when the run ends, however it ends.
+class AcquiredTextures {
+ public:
+    explicit AcquiredTextures(const zor::Device& device) : device_(static_cast<const zor::DeviceCL&>(device)) {}
+    AcquiredTextures(const AcquiredTextures&) = delete;
+    AcquiredTextures& operator=(const AcquiredTextures&) = delete;
+
+    ~AcquiredTextures() {
+        try {
+            release();
+        } catch (...) {
+            // The run has failed already and reports why.
+        }
+    }
+
+    void acquire(const TovImage* image) {
+        if (image == nullptr || image->externalKind() != EXTERNAL_KIND_TEXTURE) return;
+        cl_mem memory = image->storage()->memory();
+        memories_.reserve(memories_.size() + 1);
+        zor::check(zor::cl().clEnqueueAcquireGLObjects(device_.queue(), 1, &memory, 0, nullptr, nullptr),
+                   "clEnqueueAcquireGLObjects");
+        memories_.push_back(memory);
+    }
+
+    // Releases all of them, then reports the first failure.
+    void release() {
+        cl_int first = CL_SUCCESS;
+        for (cl_mem memory : memories_) {
+            const cl_int status = zor::cl().clEnqueueReleaseGLObjects(device_.queue(), 1, &memory, 0, nullptr, nullptr);
+            if (first == CL_SUCCESS) first = status;
+        }
+        memories_.clear();
+        zor::check(first, "clEnqueueReleaseGLObjects");
+    }
+
+ private:
+    const zor::DeviceCL& device_;
+    std::vector<cl_mem> memories_;
+};
+
+// Copies that stand in for inputs during a run.
+class StandIns {
+ public:
+    explicit StandIns(const std::vector<TovFilterParameter*>& parameters) : parameters_(parameters) {}
+    StandIns(const StandIns&) = delete;
+    StandIns& operator=(const StandIns&) = delete;
+    ~StandIns() {
+        for (TovFilterParameter* parameter : parameters_) parameter->clearStandIns();
+    }
+
+ private:
+    const std::vector<TovFilterParameter*>& parameters_;
+};
+
+uint64_t pixelsOf(const TovFilterParameter& parameter) {
+    const TovImage* image = parameter.boundImage();
+    return image == nullptr ? 0 : image->pixelCount();
+}
+
+}  // namespace
+
+bool TovImageFilter::isCombined() const {
+    for (const TovFilterParameter* parameter : imageParameters_)
+        for (uint32_t i = 0; i < parameter->imageCount(); ++i)
+            if (parameter->boundFilter(i) != nullptr) return true;
+    return false;
+}
+
+void TovImageFilter::reserveState() {
+    const uint64_t size = spec_.stateBytesPerPixel * pixelsOf(dstBuffer_);
+    if ((stateBuffer_ || size == 0) && size <= stateBufferSize_) return;
+    createStateBuffer(nullptr, size);
+}
+
+void TovImageFilter::makePrivateCopies() {
+    std::vector<const TovImage*> copied;
+    for (const AliasedInput& input : aliasedInputs(*this)) {
+        const auto known = std::find(copied.begin(), copied.end(), input.image);
+        const auto index = static_cast<size_t>(known - copied.begin());
+        if (known == copied.end()) {
+            copyPrivately(index, *input.image);
+            copied.push_back(input.image);
+        }
+        input.parameter->setStandIn(input.element, privateCopies_[index].get());
+    }
+    privateCopies_.resize(copied.size());
+}
+
+void TovImageFilter::copyPrivately(size_t index, const TovImage& image) {
+    if (image.isOpenClImage())
+        refuse(TOV_ERROR_UNSUPPORTED, "One OpenCL image cannot be both input and output of this filter");
+    const uint64_t size = image.storage()->size();
+    if (index == privateCopies_.size()) privateCopies_.emplace_back();
+    auto& copy = privateCopies_[index];
+    if (!copy || copy->size() < size) {
+        copy.reset();
+        copy = std::make_unique<zor::Buffer<char>>(*device_, size, zor::BUFFER_DEFAULT);
+    }
+    if (!copy->hasMemory()) {
+        copy.reset();
+        throw TovException{TOV_ERROR_INTERNAL_ERROR};
+    }
+    copy->copyFrom(*image.storage(), size);
+}
+
+void TovImageFilter::apply() {
+    TovContext& owner = require<TovContext>(context_);
+    const bool combined = isCombined();
+    checkSizes(*this);
+    checkValues(*this);
+    checkImages(*this);
+
+    AcquiredTextures textures(*device_);
+    textures.acquire(srcBuffer_.boundImage());
+    textures.acquire(dstBuffer_.boundImage());
+    owner.reserveScratch(spec_.scratchBytesPerPixel * pixelsOf(srcBuffer_));
+    reserveState();
+    const StandIns standIns(imageParameters_);
+    makePrivateCopies();
+
+    const TovImage& output = *dstBuffer_.boundImage();
+    const Size limits = {output.width(), output.height()};
+    const size_t count = combined ? 1 : passes_.size();
+    for (size_t i = 0; i < count; ++i) passes_[i]->Execute(combined, limits);
+    textures.release();
+    for (const auto& pass : passes_) pass->filterHasRun();
+}

@@ -1,0 +1,87 @@
+// One named, typed value of a filter.
+#pragma once
+
+#include <array>
+#include <cstdint>
+#include <string>
+#include <vector>
+
+#include "api/tov/types.h"
+#include "core/registry.h"
+#include "zor/buffer.h"
+
+class TovImage;
+class TovImageFilter;
+
+using Matrix = std::array<float, 16>;  // row after row
+using Size = std::array<uint32_t, 2>;  // width and height
+
+// More elements than a launch has arguments are never of use; a count beyond it is taken for a mistake.
+inline constexpr uint32_t kMaxArrayElements = 64;
+
+class TovFilterParameter {
+ public:
+    // type is one of TOV_PARAMETER_TYPE_...; the value starts as zero, no image or no array. The texts are not copied;
+    // the description may be null.
+    TovFilterParameter(uint32_t type, const char* name, const char* description) noexcept;
+    TovFilterParameter(const TovFilterParameter&) = delete;
+    TovFilterParameter& operator=(const TovFilterParameter&) = delete;
+
+    uint32_t type() const noexcept { return type_; }
+    const char* name() const noexcept { return name_; }
+    const char* description() const noexcept { return description_; }
+    uint32_t valueSize() const noexcept;                    // bytes
+    uint32_t count() const noexcept { return count_; }      // elements of an array, 1 otherwise
+    const void* value() const noexcept { return &value_; }  // what the host reads through
+
+    // Each throws unsupported, changing nothing, when the parameter has another type.
+    void set1u(uint32_t value);
+    void set2u(const Size& value);
+    void set1f(float value);
+    void set2f(const std::array<float, 2>& value);
+    void set3f(const std::array<float, 3>& value);
+    void set4f(const std::array<float, 4>& value);
+    void set16f(const Matrix& value);
+    void setImage(TovObject* image);  // an image, a filter or null
+    // The caller's pointers are kept and read when the filter runs. Elements of the image array have been checked.
+    void setFloatArray(const float* values, uint32_t count);
+    void setImageArray(void* const* images, uint32_t count);
+
+    uint32_t asUint() const noexcept { return value_.uints[0]; }
+    Size asSize() const noexcept { return {value_.uints[0], value_.uints[1]}; }
+    float asFloat() const noexcept { return value_.floats[0]; }
+    const Matrix& asMatrix() const noexcept { return value_.floats; }
+    const float* asFloatArray() const noexcept { return value_.floatArray; }
+
+    bool isImageLike() const noexcept {
+        return type_ == TOV_PARAMETER_TYPE_IMAGE || type_ == TOV_PARAMETER_TYPE_IMAGE_ARRAY;
+    }
+    // Elements that an image or image-array parameter binds; 0 for the other types.
+    uint32_t imageCount() const noexcept { return isImageLike() ? count_ : 0; }
+    // The live object bound to an element, null for an absent one. A deleted one throws its handle's code.
+    TovObject* boundObject(uint32_t element = 0) const;
+    TovImage* boundImage(uint32_t element = 0) const;         // null also for a filter
+    TovImageFilter* boundFilter(uint32_t element = 0) const;  // null also for an image
+
+    // Memory that stands in for a bound image while the filter runs; null for the image's own.
+    void setStandIn(uint32_t element, const zor::BufferBase* memory);
+    const zor::BufferBase* standIn(uint32_t element) const noexcept;
+    void clearStandIns() noexcept { standIns_.clear(); }
+
+ private:
+    void requireType(uint32_t type) const;
+
+    uint32_t type_;
+    uint32_t count_ = 1;
+    const char* name_;
+    const char* description_;
+    union {
+        Matrix floats;
+        std::array<uint32_t, 16> uints;
+        void* handle;
+        const float* floatArray;
+        void* const* imageArray;
+    } value_{};
+    std::vector<ObjectRef> bound_;  // what the image or the array's elements were when they were set
+    std::vector<const zor::BufferBase*> standIns_;
+};
