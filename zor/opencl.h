@@ -19,23 +19,26 @@ namespace zor {
 
 // One function of the OpenCL library. Calling one that the library lacks is a broken invariant, not a crash.
 template <class Function>
-class EntryPoint {
+class EntryPoint;
+
+template <class Result, class... Arguments>
+class EntryPoint<Result CL_API_CALL(Arguments...)> {
  public:
     constexpr explicit EntryPoint(const char* name) noexcept : name_(name) {}
 
-    template <class... Arguments>
-    auto operator()(Arguments... arguments) const {
+    Result operator()(Arguments... arguments) const {
         if (function_ == nullptr) breakInvariant(name_, "missing from the OpenCL library");
         return function_(arguments...);
     }
     explicit operator bool() const noexcept { return function_ != nullptr; }
 
     const char* name() const noexcept { return name_; }
-    void set(void* address) noexcept { function_ = reinterpret_cast<Function*>(address); }
+    void set(void* address) noexcept { function_ = reinterpret_cast<Function>(address); }
 
  private:
+    using Function = Result(CL_API_CALL*)(Arguments...);
     const char* name_;
-    Function* function_ = nullptr;
+    Function function_ = nullptr;
 };
 
 struct EntryPoints {
