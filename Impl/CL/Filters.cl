@@ -1,0 +1,202 @@
+// Filters that compute a pixel from the input's pixel at the same place; Sobel also looks at its neighbours.
+//
+// All but the self-test can be fused, which rewrites them as plain text: a kernel declares its pixel, lets the
+// coordinate macro fill it, calls nothing that is not in the shared text, and writes one plain variable at its end.
+
+// Evaluates five functions on the first five floats, to measure the device's error. One item works: the others of the
+// first column would overwrite its input when it runs in place.
+__kernel void MathTestKernel(__global float* srcBuffer, __global float* dstBuffer) {
+    if (get_global_id(0) != 0 || get_global_id(1) != 0) {
+        return;
+    }
+    const float reciprocal = 1.0f / srcBuffer[0];
+    const float square = srcBuffer[1] * srcBuffer[1];
+    const float power = pow(srcBuffer[2], 2.5f);
+    const float logarithm = log(srcBuffer[3]);
+    const float exponential = exp(srcBuffer[4]);
+    dstBuffer[0] = reciprocal;
+    dstBuffer[1] = square;
+    dstBuffer[2] = power;
+    dstBuffer[3] = logarithm;
+    dstBuffer[4] = exponential;
+}
+
+// Division by alpha; pixels that are all but transparent keep their colour.
+__kernel void NormalizationKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer)) {
+    int2 coord;
+    GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
+    float4 result = ReadPixel(srcBuffer, coord.x, coord.y);
+    const float alpha = result.w;
+    if (fabs(alpha) > 0.0001f) {
+        result /= alpha;
+    }
+    result.w = 1.0f;
+    WritePixel(dstBuffer, coord.x, coord.y, result);
+}
+
+__kernel void GammaCorrectionKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cGamma) {
+    int2 coord;
+    GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
+    const float4 color = ReadPixel(srcBuffer, coord.x, coord.y);
+    const float4 result = applyGammaCorrection(cGamma, color);
+    WritePixel(dstBuffer, coord.x, coord.y, result);
+}
+
+// Linear conversion between RGB spaces by way of CIE XYZ.
+__kernel void ColorSpaceKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), Mat4n3 cRgb2Xyz, Mat4n3 cXyz2Rgb) {
+    int2 coord;
+    GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
+    const float4 color = ReadPixel(srcBuffer, coord.x, coord.y);
+    float4 tristimulus;
+    tristimulus.x = dot3F4(cRgb2Xyz.row0, color);
+    tristimulus.y = dot3F4(cRgb2Xyz.row1, color);
+    tristimulus.z = dot3F4(cRgb2Xyz.row2, color);
+    tristimulus.w = 0.0f;
+    float4 result;
+    result.x = dot3F4(cXyz2Rgb.row0, tristimulus);
+    result.y = dot3F4(cXyz2Rgb.row1, tristimulus);
+    result.z = dot3F4(cXyz2Rgb.row2, tristimulus);
+    result.w = color.w;
+    WritePixel(dstBuffer, coord.x, coord.y, result);
+}
+
+// Contrast about middle gray, exposure in stops, then on request the filmic curve of K. Narkowicz, "ACES Filmic Tone
+// Mapping Curve" (2016).
+__kernel void SimpleToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cExposure,
+                                      float cContrast, int cApplyToneMap) {
+    int2 coord;
+    GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
+    const float4 color = ReadPixel(srcBuffer, coord.x, coord.y);
+    // Written so that a contrast of 1 adds an exact 0: dark pixels keep their last digits.
+    const float4 stretched = color * cContrast + 0.5f * (1.0f - cContrast);
+    float4 result = stretched * exp2(clamp(cExposure, -126.0f, 127.0f));
+    if (cApplyToneMap != 0) {
+        // The curve is above 1 from 7.3 on; the upper bound only keeps its squares finite.
+        const float4 bounded = clamp(result, 0.0f, 10000.0f);
+        const float4 numerator = bounded * (2.51f * bounded + 0.03f);
+        const float4 denominator = (2.43f * bounded + 0.59f) * bounded + 0.14f;
+        result = clamp(numerator / denominator, 0.0f, 1.0f);
+    }
+    result.w = 1.0f;
+    WritePixel(dstBuffer, coord.x, coord.y, result);
+}
+
+// E. Reinhard et al., "Photographic Tone Reproduction for Digital Images" (2002), the global operator.
+//
+// With L = key * luminance the pixel is scaled by Ld / luminance, where Ld is L / (1 + L) mixed with L, or with a white
+// point w, L (1 + L / w^2) / (1 + L). Ld holds L as a factor, so the luminance cancels and black stays black.
+__kernel void ReinhardToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cKey,
+                                        float cWPoint, float cBurn) {
+    int2 coord;
+    GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
+    const float4 color = ReadPixel(srcBuffer, coord.x, coord.y);
+    // The bound keeps the products below finite; the curve is flat long before.
+    const float lightness = clamp(cKey * Luminance(color), -1e28f, 1e28f);
+    const float divisor = 1.0f + lightness;
+    const float compression = divisor != 0.0f ? 1.0f / divisor : 0.0f;
+    const float simple = compression + (1.0f - compression) * cBurn;
+    const float whitened = (1.0f + lightness / cWPoint / cWPoint) * compression;
+    const float scale = cKey * (cWPoint < 0.00001f ? simple : whitened);
+    float4 result = color * scale;
+    result.w = color.w;
+    WritePixel(dstBuffer, coord.x, coord.y, result);
+}
+
+// F. Drago et al., "Adaptive Logarithmic Mapping for Displaying High Contrast Scenes" (2003).
+//
+// With Y the luminance over its average, the pixel is scaled by ln(1 + Y) / Y over the other terms. That quotient is 1
+// at Y = 0, so black stays black. All logarithms have base 2, which cancels.
+__kernel void DragoToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cBias,
+                                     float avLum, float maxLum) {
+    int2 coord;
+    GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
+    const float4 color = ReadPixel(srcBuffer, coord.x, coord.y);
+    const float brightness = Luminance(color);
+    // No logarithm here has a value at -1 or below.
+    const float adapted = clamp(brightness / avLum, -0.99999994f, 1e37f);
+    const float brightest = clamp(maxLum / avLum, -0.99999994f, 1e37f);
+
+    // Near 0 the sum 1 + Y has lost the digits of Y: ln(1 + Y) / Y from its series, (1 - Y/2 + Y^2/3 - ...).
+    const float tail = 0.25f - adapted * (0.2f - adapted * (0.16666667f - adapted * 0.14285714f));
+    const float series = 1.0f - adapted * (0.5f - adapted * (0.33333333f - adapted * tail));
+    const float quotient = log2(1.0f + adapted) * 0.69314718f / adapted;
+    const float compression = fabs(adapted) < 0.05f ? series : quotient;
+
+    // (luminance / maximum) ^ (ln bias / ln 0.5), for a negative base only where the exponent is whole.
+    const float exponent = -log2(fmax(cBias, 1e-37f));
+    const float portion = clamp(brightness / maxLum, -1e37f, 1e37f);
+    const float magnitude = exp2(clamp(log2(fmax(fabs(portion), 1e-37f)) * exponent, -120.0f, 120.0f));
+    const float whole = rint(exponent);
+    const float odd = whole - 2.0f * rint(whole * 0.5f);
+    const float mirrored = whole != exponent ? 0.0f : (odd != 0.0f ? -magnitude : magnitude);
+    const float power = portion < 0.0f ? mirrored : magnitude;
+
+    const float interpolation = log2(fmax(2.0f + 8.0f * power, 1e-37f));
+    const float decades = log1p(brightest) * 0.43429448f;
+    const float divisor = interpolation * 0.69314718f * decades * avLum;
+    const float scale = divisor != 0.0f ? compression / divisor : 0.0f;
+    float4 result = color * scale;
+    result.w = color.w;
+    WritePixel(dstBuffer, coord.x, coord.y, result);
+}
+
+__kernel void LinearToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cKey) {
+    int2 coord;
+    GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
+    const float4 color = ReadPixel(srcBuffer, coord.x, coord.y);
+    float4 result = color * cKey;
+    result.w = color.w;
+    WritePixel(dstBuffer, coord.x, coord.y, result);
+}
+
+// intensity * (1 - exp(-exposure * RGB)).
+__kernel void ExponentialToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cExposure,
+                                           float cIntensity) {
+    int2 coord;
+    GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
+    const float4 color = ReadPixel(srcBuffer, coord.x, coord.y);
+    const float4 absorbed = Exp2(clamp(color * (cExposure * -1.44269504f), -126.0f, 127.0f));
+    float4 result = cIntensity * (1.0f - absorbed);
+    result.w = color.w;
+    WritePixel(dstBuffer, coord.x, coord.y, result);
+}
+
+// Magnitude of the luminance gradient, by the 3 x 3 Sobel operator with the edge pixels repeated.
+__kernel void SobelOperatorKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer)) {
+    int2 coord;
+    GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
+    const int2 last = GET_BUFFER_SIZE(dstBuffer) - 1;
+    const int top = min(coord.y + 1, last.y);
+    const int bottom = max(coord.y - 1, 0);
+    const int left = max(coord.x - 1, 0);
+    const int right = min(coord.x + 1, last.x);
+
+    const float4 leftTop = ReadPixel(srcBuffer, left, top);
+    const float4 leftMiddle = ReadPixel(srcBuffer, left, coord.y);
+    const float4 leftBottom = ReadPixel(srcBuffer, left, bottom);
+    const float4 middleTop = ReadPixel(srcBuffer, coord.x, top);
+    const float4 middleBottom = ReadPixel(srcBuffer, coord.x, bottom);
+    const float4 rightTop = ReadPixel(srcBuffer, right, top);
+    const float4 rightMiddle = ReadPixel(srcBuffer, right, coord.y);
+    const float4 rightBottom = ReadPixel(srcBuffer, right, bottom);
+
+    // Luminance is linear: the sums are taken over colours, and its weights applied once.
+    const float4 across = (rightTop - leftTop) + 2.0f * (rightMiddle - leftMiddle) + (rightBottom - leftBottom);
+    const float4 along = (leftBottom - leftTop) + 2.0f * (middleBottom - middleTop) + (rightBottom - rightTop);
+    const float horizontal = Luminance(across);
+    const float vertical = Luminance(along);
+    const float magnitude = sqrt(horizontal * horizontal + vertical * vertical);
+    const float4 result = (float4)(magnitude, magnitude, magnitude, 1.0f);
+    WritePixel(dstBuffer, coord.x, coord.y, result);
+}
+
+// With the components (p, q, r, t): (r / t) * (1 - (p / r) / (q / r)), where r cancels; 0 where a divisor is 0.
+__kernel void ShadowCatcherKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer)) {
+    int2 coord;
+    GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
+    const float4 layers = ReadPixel(srcBuffer, coord.x, coord.y);
+    const bool divisible = layers.y != 0.0f && layers.z != 0.0f && layers.w != 0.0f;
+    const float matte = divisible ? (layers.z / layers.w) * (1.0f - layers.x / layers.y) : 0.0f;
+    const float4 result = (float4)(matte, matte, matte, 1.0f);
+    WritePixel(dstBuffer, coord.x, coord.y, result);
+}
