@@ -47,15 +47,17 @@ __kernel void ColorSpaceKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer
     int2 coord;
     GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
     const float4 color = ReadPixel(srcBuffer, coord.x, coord.y);
-    float4 tristimulus;
-    tristimulus.x = dot3F4(cRgb2Xyz.row0, color);
-    tristimulus.y = dot3F4(cRgb2Xyz.row1, color);
-    tristimulus.z = dot3F4(cRgb2Xyz.row2, color);
-    tristimulus.w = 0.0f;
-    float4 result;
-    result.x = dot3F4(cXyz2Rgb.row0, tristimulus);
-    result.y = dot3F4(cXyz2Rgb.row1, tristimulus);
-    result.z = dot3F4(cXyz2Rgb.row2, tristimulus);
+    // The columns of the product of both matrices; it is the same for all pixels.
+    const float4 red = (float4)(cRgb2Xyz.row0.x, cRgb2Xyz.row1.x, cRgb2Xyz.row2.x, 0.0f);
+    const float4 green = (float4)(cRgb2Xyz.row0.y, cRgb2Xyz.row1.y, cRgb2Xyz.row2.y, 0.0f);
+    const float4 blue = (float4)(cRgb2Xyz.row0.z, cRgb2Xyz.row1.z, cRgb2Xyz.row2.z, 0.0f);
+    const float4 from_red = (float4)(dot3F4(cXyz2Rgb.row0, red), dot3F4(cXyz2Rgb.row1, red),
+                                     dot3F4(cXyz2Rgb.row2, red), 0.0f);
+    const float4 from_green = (float4)(dot3F4(cXyz2Rgb.row0, green), dot3F4(cXyz2Rgb.row1, green),
+                                       dot3F4(cXyz2Rgb.row2, green), 0.0f);
+    const float4 from_blue = (float4)(dot3F4(cXyz2Rgb.row0, blue), dot3F4(cXyz2Rgb.row1, blue),
+                                      dot3F4(cXyz2Rgb.row2, blue), 0.0f);
+    float4 result = from_red * color.x + from_green * color.y + from_blue * color.z;
     result.w = color.w;
     WritePixel(dstBuffer, coord.x, coord.y, result);
 }
@@ -94,9 +96,11 @@ __kernel void ReinhardToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(
     const float lightness = clamp(cKey * Luminance(color), -1e28f, 1e28f);
     const float divisor = 1.0f + lightness;
     const float compression = divisor != 0.0f ? 1.0f / divisor : 0.0f;
-    const float simple = compression + (1.0f - compression) * cBurn;
-    const float whitened = (1.0f + lightness / cWPoint / cWPoint) * compression;
-    const float scale = cKey * (cWPoint < 0.00001f ? simple : whitened);
+    // Both curves are key * (constant + (1 - constant + slope * L) / (1 + L)).
+    const bool has_white = cWPoint >= 0.00001f;
+    const float constant_part = has_white ? 0.0f : cBurn;
+    const float slope = has_white ? 1.0f / (cWPoint * cWPoint) : 0.0f;
+    const float scale = cKey * (constant_part + (1.0f - constant_part + slope * lightness) * compression);
     float4 result = color * scale;
     result.w = color.w;
     WritePixel(dstBuffer, coord.x, coord.y, result);
@@ -114,26 +118,29 @@ __kernel void DragoToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(dst
     const float brightness = Luminance(color);
     // No logarithm here has a value at -1 or below.
     const float adapted = clamp(brightness / avLum, -0.99999994f, 1e37f);
+    const float portion = clamp(brightness / maxLum, -1e37f, 1e37f);
     const float brightest = clamp(maxLum / avLum, -0.99999994f, 1e37f);
 
-    // Near 0 the sum 1 + Y has lost the digits of Y: ln(1 + Y) / Y from its series, (1 - Y/2 + Y^2/3 - ...).
-    const float tail = 0.25f - adapted * (0.2f - adapted * (0.16666667f - adapted * 0.14285714f));
-    const float series = 1.0f - adapted * (0.5f - adapted * (0.33333333f - adapted * tail));
-    const float quotient = log2(1.0f + adapted) * 0.69314718f / adapted;
-    const float compression = fabs(adapted) < 0.05f ? series : quotient;
+    // Logarithms of 1 + Y, of the portion and of 1 + the greatest Y. While a sum 1 + Y has the exponent 0, Y itself is
+    // its mantissa less 1 and has all its digits, which the sum has lost.
+    const float4 arguments = (float4)(1.0f + adapted, fmax(fabs(portion), 1e-37f), 1.0f + brightest, 1.0f);
+    float4 exponents;
+    float4 mantissas = SplitMantissa(arguments, &exponents);
+    mantissas.x = exponents.x == 0.0f ? adapted : mantissas.x;
+    mantissas.z = exponents.z == 0.0f ? brightest : mantissas.z;
+    const float4 quotients = Log2Quotient(mantissas);
+    const float4 logarithms = quotients * mantissas + exponents;
+    const float compression = exponents.x == 0.0f ? quotients.x : logarithms.x / adapted;
 
     // (luminance / maximum) ^ (ln bias / ln 0.5), for a negative base only where the exponent is whole.
-    const float exponent = -log2(fmax(cBias, 1e-37f));
-    const float portion = clamp(brightness / maxLum, -1e37f, 1e37f);
-    const float magnitude = exp2(clamp(log2(fmax(fabs(portion), 1e-37f)) * exponent, -120.0f, 120.0f));
-    const float whole = rint(exponent);
-    const float odd = whole - 2.0f * rint(whole * 0.5f);
-    const float mirrored = whole != exponent ? 0.0f : (odd != 0.0f ? -magnitude : magnitude);
+    const float exponent = -Log2((float4)(fmax(cBias, 1e-37f))).x;
+    const float magnitude = Exp2((float4)(clamp(logarithms.y * exponent, -120.0f, 120.0f))).x;
+    const int whole = NearestInt((float4)(exponent)).x;
+    const float mirrored = (float)whole != exponent ? 0.0f : ((whole & 1) != 0 ? -magnitude : magnitude);
     const float power = portion < 0.0f ? mirrored : magnitude;
 
-    const float interpolation = log2(fmax(2.0f + 8.0f * power, 1e-37f));
-    const float decades = log1p(brightest) * 0.43429448f;
-    const float divisor = interpolation * 0.69314718f * decades * avLum;
+    const float interpolation = Log2((float4)(fmax(2.0f + 8.0f * power, 1e-37f))).x;
+    const float divisor = interpolation * logarithms.z * (avLum * 0.30103f);
     const float scale = divisor != 0.0f ? compression / divisor : 0.0f;
     float4 result = color * scale;
     result.w = color.w;
@@ -155,8 +162,8 @@ __kernel void ExponentialToneMappingKernel(srcBufferType(srcBuffer), dstBufferTy
     int2 coord;
     GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
     const float4 color = ReadPixel(srcBuffer, coord.x, coord.y);
-    const float4 absorbed = Exp2(clamp(color * (cExposure * -1.44269504f), -126.0f, 127.0f));
-    float4 result = cIntensity * (1.0f - absorbed);
+    const float4 absorbed = Exp2Minus1(clamp(color * (cExposure * -1.44269504f), -126.0f, 127.0f));
+    float4 result = absorbed * -cIntensity;
     result.w = color.w;
     WritePixel(dstBuffer, coord.x, coord.y, result);
 }
@@ -196,7 +203,8 @@ __kernel void ShadowCatcherKernel(srcBufferType(srcBuffer), dstBufferType(dstBuf
     GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
     const float4 layers = ReadPixel(srcBuffer, coord.x, coord.y);
     const bool divisible = layers.y != 0.0f && layers.z != 0.0f && layers.w != 0.0f;
-    const float matte = divisible ? (layers.z / layers.w) * (1.0f - layers.x / layers.y) : 0.0f;
+    const float2 quotients = divisible ? layers.xz / layers.yw : (float2)(0.0f);
+    const float matte = quotients.y * (1.0f - quotients.x);
     const float4 result = (float4)(matte, matte, matte, 1.0f);
     WritePixel(dstBuffer, coord.x, coord.y, result);
 }
