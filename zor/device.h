@@ -47,12 +47,12 @@ struct EventHolder {
 
 // What a kernel is looked up by. The views must live for the call only.
 struct KernelRequest {
-    std::string_view fileName;  // nominal source file, without ".cl"
-    std::string_view kernelName;
-    std::optional<std::string_view> options;         // compiler options
-    std::span<const std::string_view> sources;       // source texts; none: read fileName + ".cl" from disk
-    std::span<const std::string_view> dependencies;  // files that a cached binary must be newer than
-    bool keepInCache = true;                         // may reuse the map's kernel and the cached binary
+    std::string_view fileName{};  // nominal source file, without ".cl"
+    std::string_view kernelName{};
+    std::optional<std::string_view> options{};         // compiler options
+    std::span<const std::string_view> sources{};       // source texts; none: read fileName + ".cl" from disk
+    std::span<const std::string_view> dependencies{};  // files that a cached binary must be newer than
+    bool keepInCache = true;                           // may reuse the map's kernel and the cached binary
 };
 
 // All text operations write at most kDeviceTextBytes bytes, zero-terminated.

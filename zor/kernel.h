@@ -49,7 +49,7 @@ class Launcher {
 
     // The next argument, by value: numbers, float2 pairs, matrices.
     template <class Value>
-    void arg(const Value& value) {
+    requires(!std::is_base_of_v<BufferBase, Value>) void arg(const Value& value) {
         static_assert(std::is_trivially_copyable_v<Value> && !std::is_pointer_v<Value>);
         static_assert(sizeof(Value) <= kMaxArgumentBytes);
         setNext(&value, sizeof value);
