@@ -4,14 +4,16 @@
 #include <string>
 
 #include "core/exception.h"
+#include "core/filter_tree.h"
 #include "core/image_filter.h"
 
 namespace {
 
 constexpr uint32_t kMaxSide = std::numeric_limits<int32_t>::max();  // kernels take sizes as signed numbers
 
-// One image bound to one parameter.
+// One image bound to one parameter of one filter of the tree.
 struct Binding {
+    const FilterNode* node;
     TovFilterParameter* parameter;
     uint32_t element;
     const TovImage* image;
@@ -25,12 +27,17 @@ bool isOutput(const TovImageFilter& filter, const TovFilterParameter& parameter)
     return false;
 }
 
-std::vector<Binding> boundImages(const TovImageFilter& filter) {
+// Outputs that are computed where they are read are no images.
+std::vector<Binding> boundImages(const FilterTree& tree) {
     std::vector<Binding> bindings;
-    for (TovFilterParameter* parameter : filter.imageParameters()) {
-        for (uint32_t i = 0; i < parameter->imageCount(); ++i)
-            if (const TovImage* image = parameter->boundImage(i))
-                bindings.push_back({parameter, i, image, isOutput(filter, *parameter)});
+    for (const FilterNode& node : tree.nodes()) {
+        for (TovFilterParameter* parameter : node.filter->imageParameters()) {
+            if (parameter->runSize()) continue;
+            const bool output = isOutput(*node.filter, *parameter);
+            for (uint32_t i = 0; i < parameter->imageCount(); ++i)
+                if (const TovImage* image = parameter->boundImage(i))
+                    bindings.push_back({&node, parameter, i, image, output});
+        }
     }
     return bindings;
 }
@@ -51,10 +58,10 @@ void requireBound(TovImageFilter& filter, const char* name) {
         refuse(TOV_ERROR_INVALID_OPERATION, std::string("No image is bound to ") + name);
 }
 
-void requireUsable(const Binding& binding, const TovImageFilter& filter) {
+void requireUsable(const Binding& binding, const DevicePointer& device) {
     const TovImage& image = *binding.image;
     const tov_image_desc& desc = image.desc();
-    if (image.device() != filter.device()) refuseImage(binding, "belongs to another context than the filter");
+    if (image.device() != device) refuseImage(binding, "belongs to another context than the filter");
     if (componentBytes(desc.type) == 0) refuseImage(binding, "has an unknown component type");
     if (desc.num_components < 1 || desc.num_components > 4) refuseImage(binding, "must have 1 to 4 components");
     if (image.width() > kMaxSide || image.height() > kMaxSide) refuseImage(binding, "is too wide or too high");
@@ -65,15 +72,17 @@ void requireUsable(const Binding& binding, const TovImageFilter& filter) {
         refuseImage(binding, "has less storage than its pixels need (is the row pitch smaller than the width?)");
 }
 
-void requireSize(const Binding& binding, const TovImage& output, SizeRule rule) {
+void requireSize(const Binding& binding) {
+    const SizeRule rule = binding.node->filter->spec().sizeRule;
+    const Size& output = binding.node->outputSize;
     const TovImage& image = *binding.image;
     if (rule == SizeRule::Unchecked) return;
     if (rule == SizeRule::AnyInput && std::string_view(binding.parameter->name()) == "srcBuffer") return;
-    const bool covers = image.width() >= output.width() && image.height() >= output.height();
-    const bool equals = image.width() == output.width() && image.height() == output.height();
+    const bool covers = image.width() >= output[0] && image.height() >= output[1];
+    const bool equals = image.width() == output[0] && image.height() == output[1];
     if (rule == SizeRule::EqualOutput ? equals : covers) return;
     refuseImage(binding, "has " + sizeText(image.width(), image.height()) + " pixels, the output " +
-                             sizeText(output.width(), output.height()) +
+                             sizeText(output[0], output[1]) +
                              (rule == SizeRule::EqualOutput ? ": this filter needs equal sizes" : ""));
 }
 
@@ -94,27 +103,33 @@ void checkSizes(TovImageFilter& filter) {
     }
 }
 
-void checkImages(TovImageFilter& filter) {
-    requireBound(filter, "srcBuffer");
-    requireBound(filter, "dstBuffer");
-    for (const char* name : filter.spec().required) requireBound(filter, name);
-    const std::vector<Binding> bindings = boundImages(filter);
-    const TovImage& output = *filter.find("dstBuffer")->boundImage();
-    for (const Binding& binding : bindings) requireUsable(binding, filter);
-    for (const Binding& binding : bindings) requireSize(binding, output, filter.spec().sizeRule);
+void checkImages(const FilterTree& tree) {
+    const FilterNode& root = tree.nodes().front();
+    requireBound(*root.filter, "dstBuffer");
+    for (const FilterNode& node : tree.nodes()) {
+        if (node.filter->device() != root.filter->device())
+            refuse(TOV_ERROR_INVALID_OPERATION, "A filter that feeds another must belong to the same context");
+        requireBound(*node.filter, "srcBuffer");
+        for (const char* name : node.filter->spec().required) requireBound(*node.filter, name);
+    }
+    const std::vector<Binding> bindings = boundImages(tree);
+    const TovImage& output = *root.filter->find("dstBuffer")->boundImage();
+    for (const Binding& binding : bindings) requireUsable(binding, root.filter->device());
+    for (const Binding& binding : bindings) requireSize(binding);
     for (const Binding& binding : bindings)
-        if (binding.isOutput && binding.image != &output && binding.image->sharesMemoryWith(output))
+        if (binding.isOutput && std::string_view(binding.parameter->name()) != "dstBuffer" &&
+            binding.image->sharesMemoryWith(output))
             refuse(TOV_ERROR_INVALID_PARAMETER, "Two outputs of a filter must not share memory");
 }
 
-std::vector<AliasedInput> aliasedInputs(TovImageFilter& filter) {
+std::vector<AliasedInput> aliasedInputs(const FilterTree& tree) {
     std::vector<AliasedInput> aliased;
-    const std::vector<Binding> bindings = boundImages(filter);
+    const std::vector<Binding> bindings = boundImages(tree);
     for (const Binding& input : bindings) {
         if (input.isOutput) continue;
         for (const Binding& output : bindings) {
             if (!output.isOutput || !input.image->sharesMemoryWith(*output.image)) continue;
-            if (filter.spec().inPlace == InPlace::PerPixel && sameLayout(*input.image, *output.image)) continue;
+            if (!input.node->readsAround && sameLayout(*input.image, *output.image)) continue;
             aliased.push_back({input.parameter, input.element, input.image});
             break;
         }

@@ -86,7 +86,10 @@ TovFilterParameter& TovImageFilter::byName(std::string_view name) {
 
 void TovImageFilter::set2u(std::string_view name, const Size& value) {
     if (name == "srcRec") return srcBufferSize_.set2u(value);
-    if (name == "dstRec") return dstBufferSize_.set2u(value);
+    if (name == "dstRec") {
+        explicitOutputSize_ = value;
+        return dstBufferSize_.set2u(value);
+    }
     byName(name).set2u(value);
 }
 
@@ -99,6 +102,7 @@ void TovImageFilter::setImage(std::string_view name, TovImage& image) {
         srcBufferSize_.set2u(sizeOf(image));
         srcBuffer_.setImage(&image);
     } else if (name == "dstBuffer") {
+        explicitOutputSize_.reset();
         dstBufferSize_.set2u(sizeOf(image));
         dstBuffer_.setImage(&image);
     } else {

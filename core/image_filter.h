@@ -3,6 +3,8 @@
 
 #include <cstdint>
 #include <memory>
+#include <optional>
+#include <string>
 #include <string_view>
 #include <vector>
 
@@ -13,6 +15,8 @@
 #include "filters/catalogue.h"
 #include "filters/parameter.h"
 #include "kernelgen/pass.h"
+
+class FilterTree;
 
 class TovImageFilter final : public TovObject {
  public:
@@ -51,6 +55,9 @@ class TovImageFilter final : public TovObject {
     // Checks everything that is bound, then runs the passes; nothing is launched when a check fails.
     void apply();
     TovFilterPass& firstPass() noexcept { return *passes_.front(); }
+    const std::string& kernelName() const noexcept { return passes_.front()->code().name; }
+    // The output size that the host set by "dstRec" since the last binding of an output.
+    const std::optional<Size>& explicitOutputSize() const noexcept { return explicitOutputSize_; }
 
     // Built-in or listed parameter; null for an unknown name. For the catalogue and the checks.
     TovFilterParameter* find(std::string_view name) noexcept;
@@ -71,9 +78,8 @@ class TovImageFilter final : public TovObject {
  private:
     TovFilterParameter& byName(std::string_view name);
     bool isFedBy(const TovImageFilter& filter) const;
-    bool isCombined() const;
     void reserveState();
-    void makePrivateCopies();
+    void makePrivateCopies(const FilterTree& tree);
     void copyPrivately(size_t index, const TovImage& image);
 
     DevicePointer device_;
@@ -84,6 +90,7 @@ class TovImageFilter final : public TovObject {
     TovFilterParameter srcBufferSize_{TOV_PARAMETER_TYPE_UINT2, "srcBufferSize", ""};
     TovFilterParameter dstBuffer_{TOV_PARAMETER_TYPE_IMAGE, "dstBuffer", ""};
     TovFilterParameter dstBufferSize_{TOV_PARAMETER_TYPE_UINT2, "dstBufferSize", ""};
+    std::optional<Size> explicitOutputSize_;
     StateSlot stateBuffer_;
     uint32_t stateBufferSize_ = 0;
     std::vector<std::unique_ptr<TovFilterParameter>> parameters_;

@@ -3,6 +3,7 @@
 #include <array>
 
 #include "core/exception.h"
+#include "core/filter_tree.h"
 #include "core/image_checks.h"
 #include "core/image_filter.h"
 #include "filters/value_checks.h"
@@ -52,15 +53,16 @@ class AcquiredTextures {
 // Copies that stand in for inputs during a run.
 class StandIns {
  public:
-    explicit StandIns(const std::vector<TovFilterParameter*>& parameters) : parameters_(parameters) {}
+    explicit StandIns(const FilterTree& tree) : tree_(tree) {}
     StandIns(const StandIns&) = delete;
     StandIns& operator=(const StandIns&) = delete;
     ~StandIns() {
-        for (TovFilterParameter* parameter : parameters_) parameter->clearStandIns();
+        for (const FilterNode& node : tree_.nodes())
+            for (TovFilterParameter* parameter : node.filter->imageParameters()) parameter->clearStandIns();
     }
 
  private:
-    const std::vector<TovFilterParameter*>& parameters_;
+    const FilterTree& tree_;
 };
 
 uint64_t pixelsOf(const TovFilterParameter& parameter) {
@@ -70,22 +72,15 @@ uint64_t pixelsOf(const TovFilterParameter& parameter) {
 
 }  // namespace
 
-bool TovImageFilter::isCombined() const {
-    for (const TovFilterParameter* parameter : imageParameters_)
-        for (uint32_t i = 0; i < parameter->imageCount(); ++i)
-            if (parameter->boundFilter(i) != nullptr) return true;
-    return false;
-}
-
 void TovImageFilter::reserveState() {
     const uint64_t size = spec_.stateBytesPerPixel * pixelsOf(dstBuffer_);
     if ((stateBuffer_ || size == 0) && size <= stateBufferSize_) return;
     createStateBuffer(nullptr, size);
 }
 
-void TovImageFilter::makePrivateCopies() {
+void TovImageFilter::makePrivateCopies(const FilterTree& tree) {
     std::vector<const TovImage*> copied;
-    for (const AliasedInput& input : aliasedInputs(*this)) {
+    for (const AliasedInput& input : aliasedInputs(tree)) {
         const auto known = std::find(copied.begin(), copied.end(), input.image);
         const auto index = static_cast<size_t>(known - copied.begin());
         if (known == copied.end()) {
@@ -116,23 +111,26 @@ void TovImageFilter::copyPrivately(size_t index, const TovImage& image) {
 
 void TovImageFilter::apply() {
     TovContext& owner = require<TovContext>(context_);
-    const bool combined = isCombined();
+    const FilterTree tree(*this);
     checkSizes(*this);
-    checkValues(*this);
-    checkImages(*this);
+    for (const FilterNode& node : tree.nodes()) {
+        require<TovContext>(node.filter->context_);
+        checkValues(*node.filter);
+    }
+    checkImages(tree);
 
     AcquiredTextures textures(*device_);
-    textures.acquire(srcBuffer_.boundImage());
+    for (const FilterNode& node : tree.nodes()) textures.acquire(node.filter->srcBuffer_.boundImage());
     textures.acquire(dstBuffer_.boundImage());
     owner.reserveScratch(spec_.scratchBytesPerPixel * pixelsOf(srcBuffer_));
     reserveState();
-    const StandIns standIns(imageParameters_);
-    makePrivateCopies();
+    const StandIns standIns(tree);
+    makePrivateCopies(tree);
 
     const TovImage& output = *dstBuffer_.boundImage();
     const Size limits = {output.width(), output.height()};
-    const size_t count = combined ? 1 : passes_.size();
-    for (size_t i = 0; i < count; ++i) passes_[i]->Execute(combined, limits);
+    for (const auto& pass : passes_) pass->Execute(tree.isFused() ? this : nullptr, limits);
     textures.release();
-    for (const auto& pass : passes_) pass->filterHasRun();
+    for (const FilterNode& node : tree.nodes())
+        for (const auto& pass : node.filter->passes_) pass->filterHasRun();
 }

@@ -83,6 +83,7 @@ struct FilterSpec {
     const std::vector<uint8_t>& (*stateContents)() = nullptr;
     InPlace inPlace = InPlace::PrivateCopy;
     SizeRule sizeRule = SizeRule::CoverOutput;
+    bool fusable = false;  // one pass without memory of its own, in a kernel that keeps to the form of fusion
     std::vector<const char*> required = {};  // image parameters that must be bound, besides input and output
     std::vector<const char*> outputs = {};   // image parameters that are written, besides dstBuffer
     std::vector<ParameterSpec> parameters = {};

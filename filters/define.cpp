@@ -16,6 +16,7 @@ void requireType(const TovFilterParameter& parameter, uint32_t type) {
 }
 
 std::string imageDefines(const std::string& name, const TovFilterParameter& parameter, uint32_t element) {
+    if (const auto& size = parameter.runSize()) return computedImageDefines(name, (*size)[0], (*size)[1]);
     TovObject* bound = parameter.boundObject(element);
     if (bound == nullptr) return absentImageDefines(name);
     if (const auto* image = as<TovImage>(bound)) return GetImageDefines(name, image->desc(), image->isOpenClImage());

@@ -26,6 +26,9 @@ class TovInternalParameter {
     // The filter has run with the arguments last set.
     virtual void filterHasRun() {}
 
+    // The parameter that it passes or derives from; null for buffers.
+    const TovFilterParameter* parameter() const noexcept { return parameter_; }
+
  protected:
     TovFilterParameter* parameter_ = nullptr;
 

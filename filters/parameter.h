@@ -3,6 +3,7 @@
 
 #include <array>
 #include <cstdint>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -48,7 +49,7 @@ class TovFilterParameter {
     void setImageArray(void* const* images, uint32_t count);
 
     uint32_t asUint() const noexcept { return value_.uints[0]; }
-    Size asSize() const noexcept { return {value_.uints[0], value_.uints[1]}; }
+    Size asSize() const noexcept { return runSize_.value_or(Size{value_.uints[0], value_.uints[1]}); }
     float asFloat() const noexcept { return value_.floats[0]; }
     const Matrix& asMatrix() const noexcept { return value_.floats; }
     const float* asFloatArray() const noexcept { return value_.floatArray; }
@@ -68,6 +69,12 @@ class TovFilterParameter {
     const zor::BufferBase* standIn(uint32_t element) const noexcept;
     void clearStandIns() noexcept { standIns_.clear(); }
 
+    // What a fused run says of a filter inside it: of a size, another value than the one set; of an output, that it is
+    // computed where it is read, in this size, and that its binding is of no account.
+    void setRunSize(const Size& size) noexcept { runSize_ = size; }
+    const std::optional<Size>& runSize() const noexcept { return runSize_; }
+    void clearRunSize() noexcept { runSize_.reset(); }
+
  private:
     void requireType(uint32_t type) const;
 
@@ -84,4 +91,5 @@ class TovFilterParameter {
     } value_{};
     std::vector<ObjectRef> bound_;  // what the image or the array's elements were when they were set
     std::vector<const zor::BufferBase*> standIns_;
+    std::optional<Size> runSize_;
 };

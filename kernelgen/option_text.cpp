@@ -57,6 +57,12 @@ std::string GetImageDefines(std::string_view name, const tov_image_desc& desc, b
            define(prefix + "_COMP_TYPE", isOpenClImage ? "sampler" : componentTypeName(desc.type));
 }
 
+std::string computedImageDefines(std::string_view name, uint32_t width, uint32_t height) {
+    const std::string prefix(name);
+    return sizeDefine(name, width, height) + define(prefix + "_COMP_NUM", "none") +
+           define(prefix + "_COMP_TYPE", "none");
+}
+
 std::string absentImageDefines(std::string_view name) {
     const std::string prefix(name);
     return define(prefix + "_COMP_NUM", "none") + define(prefix + "_COMP_TYPE", "none") +

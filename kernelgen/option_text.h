@@ -20,6 +20,9 @@ std::string define(std::string_view name, std::string_view value);
 // object has an empty count and the type "sampler".
 std::string GetImageDefines(std::string_view name, const tov_image_desc& desc, bool isOpenClImage);
 
+// The same for an image that is computed where it is read: no layout, only a size.
+std::string computedImageDefines(std::string_view name, uint32_t width, uint32_t height);
+
 // The same for an absent image: both "none", size 1 x 1.
 std::string absentImageDefines(std::string_view name);
 

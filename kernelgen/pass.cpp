@@ -2,9 +2,13 @@
 
 #include <algorithm>
 #include <array>
+#include <filesystem>
 #include <limits>
+#include <span>
 
 #include "core/exception.h"
+#include "kernelgen/fusion.h"
+#include "kernelgen/option_text.h"
 #include "kernelgen/sources.h"
 #include "zor/kernel_builder.h"
 
@@ -70,7 +74,7 @@ std::string TovFilterPass::GetBuildOptions() const {
 void TovFilterPass::SetArguments(zor::Launcher& launcher, bool skipOutputs) const {
     for (size_t i = 0; i < arguments_.size(); ++i) {
         const bool isOutput =
-            i < code_.arguments.size() && code_.arguments[i].name.find("dstBuffer") != std::string::npos;
+            i < code_.arguments.size() && code_.arguments[i].type.find("dstBufferType") != std::string::npos;
         if (!(skipOutputs && isOutput)) arguments_[i]->SetKernelArgument(launcher);
     }
 }
@@ -87,10 +91,29 @@ zor::Kernel* TovFilterPass::findKernel() const {
                                          .keepInCache = true});
 }
 
-void TovFilterPass::Execute(bool combined, const Size& limits) {
-    if (combined) refuse(TOV_ERROR_UNSUPPORTED, "Filters that feed filters directly cannot run yet: use an image");
+// The fixed options of a single kernel are left out: the generated text carries every definition. A file of the shared
+// text on disk is included and outdates cached binaries; without one the embedded text takes its place.
+zor::Kernel* TovFilterPass::findFusedKernel(TovImageFilter& root) const {
+    const std::string directory(kKernelDirectory);
+    const std::string text = GenerateSource(BuildJoinCode(root));
+    const std::string options = " -I" + directory + " -D HASH=" + decimal(HashSource(text.data(), text.size()));
+    const std::string common = directory + "common.cl";
+    const std::array<std::string_view, 1> dependencies = {common};
+    const std::array<std::string_view, 1> included = {text};
+    const std::array<std::string_view, 2> embedded = {commonKernelSource(),
+                                                      std::string_view(text).substr(kIncludeCommon.size())};
+    const bool isOnDisk = std::filesystem::exists(common);
+    return context_.device()->getKernel({.fileName = directory + "Combined",
+                                         .kernelName = kernelName_,
+                                         .options = options,
+                                         .sources = isOnDisk ? std::span<const std::string_view>(included) : embedded,
+                                         .dependencies = dependencies,
+                                         .keepInCache = true});
+}
+
+void TovFilterPass::Execute(TovImageFilter* fusedRoot, const Size& limits) {
     zor::setCacheDirectory(context_.cachePath());
-    zor::Kernel* kernel = findKernel();
+    zor::Kernel* kernel = fusedRoot != nullptr ? findFusedKernel(*fusedRoot) : findKernel();
     if (kernel == nullptr) throw TovException{TOV_ERROR_INTERNAL_ERROR};
     zor::Launcher launcher(*context_.device(), *kernel);
     SetArguments(launcher, false);

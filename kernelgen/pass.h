@@ -42,14 +42,19 @@ class TovFilterPass {
     // Binds the arguments in kernel order. An inner pass of a fused kernel leaves its outputs out.
     void SetArguments(zor::Launcher& launcher, bool skipOutputs) const;
     // Builds or finds the kernel, binds and launches it over the size parameter, cut to limits (pixels), and waits.
-    void Execute(bool combined, const Size& limits);
+    // With a filter given, the kernel is the fused one of the tree under that filter, whose first pass this is.
+    void Execute(TovImageFilter* fusedRoot, const Size& limits);
     void filterHasRun();
 
     const TovKernelCode& code() const noexcept { return code_; }
-    const std::string& sourceName() const noexcept { return sourceName_; }
+    // The parameter behind an entry of the argument list; null for buffers and past the end.
+    const TovFilterParameter* argumentParameter(size_t index) const noexcept {
+        return index < arguments_.size() ? arguments_[index]->parameter() : nullptr;
+    }
 
  private:
     zor::Kernel* findKernel() const;
+    zor::Kernel* findFusedKernel(TovImageFilter& root) const;
     void launch(zor::Launcher& launcher, const Size& limits) const;
 
     std::string kernelName_;
