@@ -30,7 +30,7 @@ FileTimes timesOf(const std::string& path) noexcept {
     return {ticks, ticks};
 }
 
-std::string libraryPath() {
+std::string carrierPath() {
     HMODULE module = nullptr;
     const auto flags = GET_MODULE_HANDLE_EX_FLAG_FROM_ADDRESS | GET_MODULE_HANDLE_EX_FLAG_UNCHANGED_REFCOUNT;
     if (!GetModuleHandleExA(flags, reinterpret_cast<const char*>(&libraryTime), &module)) return {};
@@ -65,12 +65,19 @@ FileTimes timesOf(const std::string& path) noexcept {
     return {nanoseconds(modificationTime(info)), nanoseconds(changeTime(info))};
 }
 
-std::string libraryPath() {
+std::string carrierPath() {
     Dl_info info = {};
     if (dladdr(reinterpret_cast<const void*>(&libraryTime), &info) == 0 || info.dli_fname == nullptr) return {};
     return info.dli_fname;
 }
 #endif
+
+// The library file that carries this code. Its name may be relative to the directory that the host was in when it
+// loaded us, so it is resolved then.
+const std::string libraryFile = [] {
+    std::error_code error;
+    return std::filesystem::absolute(carrierPath(), error).string();
+}();
 
 // 0 when the path is a file that can be read, otherwise the system's error. Pipes and devices, which could block, are
 // never opened.
@@ -104,7 +111,7 @@ bool fileExists(const std::string& path) noexcept {
 }
 
 FileTime libraryTime() noexcept {
-    const FileTimes times = timesOf(libraryPath());
+    const FileTimes times = timesOf(libraryFile);
     return std::max(times.modified, times.changed);
 }
 

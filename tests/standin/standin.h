@@ -1,0 +1,179 @@
+// A scripted stand-in for the OpenCL library. Built as libOpenCL.so.1 into a folder of its own, it is found through the
+// library path by whatever opens that name. It keeps platforms, devices, buffers, programs and kernels in memory;
+// kernels compute nothing unless onLaunch does. A test scripts it and reads its log through state():
+//
+//     standin::State& driver = standin::state();
+//     driver.reset();                                       // in every SetUp
+//     driver.platforms = {{.vendor = "Apple", .devices = {standin::gpu("Small")}}};
+//     driver.fail("clCreateBuffer", CL_OUT_OF_RESOURCES);   // the next call fails
+//     ...
+//     EXPECT_EQ(driver.launches.back().kernel, "GammaKernel");
+//     EXPECT_EQ(driver.liveObjects(), 0u);                  // every object was released
+//     EXPECT_THAT(driver.misuse, IsEmpty());                // no dead or foreign handle, no double unmap
+//
+// Library and tests are built by one compiler, so the state is shared as plain C++ objects.
+#pragma once
+
+#ifndef CL_TARGET_OPENCL_VERSION
+#define CL_TARGET_OPENCL_VERSION 120
+#endif
+#ifndef CL_USE_DEPRECATED_OPENCL_1_1_APIS
+#define CL_USE_DEPRECATED_OPENCL_1_1_APIS
+#endif
+#include <CL/cl.h>
+#include <CL/cl_gl.h>
+#include <dlfcn.h>
+
+#include <cstdint>
+#include <cstring>
+#include <functional>
+#include <map>
+#include <optional>
+#include <string>
+#include <vector>
+
+namespace standin {
+
+struct Device {
+    std::string name = "Stand-in";
+    cl_device_type type = CL_DEVICE_TYPE_GPU;
+    std::string vendor = "Stand-in vendor";
+    std::string version = "OpenCL 1.2 stand-in";
+    std::string driverVersion = "1.0";
+    std::optional<std::string> boardName{};  // answers the vendor-specific query 0x4038
+    std::vector<size_t> workItemSizes{1024, 1024, 64};
+    size_t workGroupSize = 1024;
+    uint64_t globalMemory = uint64_t{4} << 30;   // bytes
+    uint64_t maxAllocation = uint64_t{1} << 30;  // bytes
+};
+
+inline Device gpu(std::string name) {
+    return {.name = std::move(name)};
+}
+inline Device cpu(std::string name) {
+    return {.name = std::move(name), .type = CL_DEVICE_TYPE_CPU};
+}
+
+struct Platform {
+    std::string vendor = "Stand-in vendor";
+    std::vector<Device> devices{};
+};
+
+// One call as it reached the library. What text and numbers hold is said beside each function that fills them.
+struct Call {
+    std::string name;
+    std::string text;
+    std::vector<uint64_t> numbers;
+};
+
+struct Argument {
+    size_t size = 0;
+    std::vector<unsigned char> bytes;  // empty for a null value
+
+    template <class Value>
+    Value as() const {
+        Value value{};
+        if (bytes.size() == sizeof value) std::memcpy(&value, bytes.data(), sizeof value);
+        return value;
+    }
+};
+
+struct Launch {
+    std::string kernel;
+    std::string options;  // of the program
+    std::string source;
+    bool fromBinary = false;
+    std::vector<size_t> global;
+    std::vector<size_t> local;
+    std::map<uint32_t, Argument> arguments;
+};
+
+struct State {
+    // What the machine offers. Without platforms clGetPlatformIDs gives -1001.
+    std::vector<Platform> platforms;
+    bool refuseBinaries = false;   // clCreateProgramWithBinary gives CL_INVALID_BINARY
+    bool failBuilds = false;       // clBuildProgram gives CL_BUILD_PROGRAM_FAILURE; so does a source with "#error"
+    std::string buildLog;          // of a failed build
+    bool hasGlContextInfo = true;  // clGetGLContextInfoKHR can be found
+    size_t glDevice = 0;           // the device that it names, counted over all platforms
+    uint64_t queueThread = 0;      // answers the vendor-specific queue query 0x403E
+    std::function<void(const Launch&)> onLaunch;  // called at each launch, may read and write bytesOf()
+
+    // What happened.
+    std::vector<Call> calls;
+    std::vector<Launch> launches;
+    std::vector<std::string> misuse;  // dead or null handles, bad unmaps
+
+    // Makes a call fail with the status from its at-th time on from now, count times.
+    void fail(const std::string& call, int32_t status, uint32_t at = 1, uint32_t count = 1) {
+        failures[call] = {status, at, count};
+    }
+
+    size_t callCount(const std::string& name) const {
+        size_t count = 0;
+        for (const Call& call : calls) count += call.name == name ? 1 : 0;
+        return count;
+    }
+    // The latest call of the name; an empty one where there was none.
+    Call lastCall(const std::string& name) const {
+        for (auto call = calls.rbegin(); call != calls.rend(); ++call)
+            if (call->name == name) return *call;
+        return {};
+    }
+    // Objects created and not released; of one kind: "context", "queue", "memory", "program", "kernel", "event".
+    size_t liveObjects(const std::string& kind = "") const {
+        size_t count = 0;
+        for (const auto& [object, liveKind] : live) count += kind.empty() || kind == liveKind ? 1 : 0;
+        return count;
+    }
+
+    // Forgets script and log and offers one platform with a GPU and a CPU. Live objects stay known.
+    void reset() {
+        const std::map<const void*, std::string> kept = live;
+        const auto keptMaps = maps;
+        *this = State{};
+        live = kept;
+        maps = keptMaps;
+        platforms = {{.devices = {gpu("Stand-in GPU"), cpu("Stand-in CPU")}}};
+    }
+
+    // The library's own.
+    struct Failure {
+        int32_t status = 0;
+        uint32_t at = 1;
+        uint32_t count = 1;
+    };
+    std::map<std::string, Failure> failures;
+    std::map<const void*, std::string> live;
+    std::map<std::pair<const void*, const void*>, uint32_t> maps;  // memory object and pointer, not yet unmapped
+};
+
+inline void* symbol(const char* name) {
+    static void* const library = dlopen("libOpenCL.so.1", RTLD_NOW | RTLD_LOCAL);
+    return library != nullptr ? dlsym(library, name) : nullptr;
+}
+
+// A function of the library for the test's own use: function<decltype(clCreateImage)>("clCreateImage").
+template <class Function>
+Function* function(const char* name) {
+    return reinterpret_cast<Function*>(symbol(name));
+}
+
+// Null when another OpenCL library answers to the name.
+inline State* findState() {
+    using Get = State*();
+    auto* const get = reinterpret_cast<Get*>(symbol("standin_state"));
+    return get != nullptr ? get() : nullptr;
+}
+
+inline State& state() {
+    return *findState();
+}
+
+// The bytes of a buffer, whose size is given to bytes when that is not null.
+inline unsigned char* bytesOf(cl_mem memory, size_t* bytes = nullptr) {
+    using Get = unsigned char*(cl_mem, size_t*);
+    return reinterpret_cast<Get*>(symbol("standin_bytes"))(memory, bytes);
+}
+
+}  // namespace standin
