@@ -108,7 +108,8 @@ zor::Kernel* TovFilterPass::findFusedKernel(TovImageFilter& root) const {
                                          .options = options,
                                          .sources = isOnDisk ? std::span<const std::string_view>(included) : embedded,
                                          .dependencies = dependencies,
-                                         .keepInCache = true});
+                                         .keepInCache = true,
+                                         .generatedSources = true});
 }
 
 void TovFilterPass::Execute(TovImageFilter* fusedRoot, const Size& limits) {

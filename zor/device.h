@@ -53,6 +53,8 @@ struct KernelRequest {
     std::span<const std::string_view> sources{};       // source texts; none: read fileName + ".cl" from disk
     std::span<const std::string_view> dependencies{};  // files that a cached binary must be newer than
     bool keepInCache = true;                           // may reuse the map's kernel and the cached binary
+    // The texts differ from request to request: an option text that only holds their hash does not tell them apart.
+    bool generatedSources = false;
 };
 
 // All text operations write at most kDeviceTextBytes bytes, zero-terminated.

@@ -7,6 +7,7 @@
 #include <limits>
 #include <vector>
 
+#include "zor/cache_name.h"
 #include "zor/context_creation.h"
 #include "zor/device_info.h"
 #include "zor/discovery.h"
@@ -210,7 +211,9 @@ Kernel* DeviceCL::getKernel(const KernelRequest& request) {
     requireDevice("getKernel");
     std::string mapName = kernelMapName(context_, request);
     if (!request.keepInCache) kernels_->remove(mapName);
-    if (Kernel* const known = kernels_->find(mapName)) return known;
+    const uint64_t identity = request.generatedSources ? programIdentity(*this, request.fileName, request.sources) : 0;
+    Kernel* const known = kernels_->find(mapName);
+    if (known != nullptr && known->sourceIdentity() == identity) return known;
 
     KernelBuilder builder(*this);
     if (request.sources.empty()) {
@@ -222,7 +225,7 @@ Kernel* DeviceCL::getKernel(const KernelRequest& request) {
     std::string name(request.kernelName);
     KernelHandle handle = createKernel(builder.program(), name);
     if (handle == nullptr) return nullptr;
-    return kernels_->insert(std::move(mapName), std::make_unique<Kernel>(std::move(handle), std::move(name)));
+    return kernels_->insert(std::move(mapName), std::make_unique<Kernel>(std::move(handle), std::move(name), identity));
 }
 
 uint64_t DeviceCL::queryGlobalMemorySize() const {

@@ -18,15 +18,19 @@ inline constexpr size_t kMaxArgumentBytes = 64;
 
 class Kernel {
  public:
-    Kernel(KernelHandle kernel, std::string name) : kernel_(std::move(kernel)), name_(std::move(name)) {}
+    // sourceIdentity is programIdentity of generated texts, 0 of texts that never change.
+    Kernel(KernelHandle kernel, std::string name, uint64_t sourceIdentity = 0)
+        : kernel_(std::move(kernel)), name_(std::move(name)), sourceIdentity_(sourceIdentity) {}
 
     uint32_t kind() const noexcept { return DEVICE_KIND_CL; }
     cl_kernel handle() const noexcept { return kernel_.get(); }
     const std::string& name() const noexcept { return name_; }
+    uint64_t sourceIdentity() const noexcept { return sourceIdentity_; }
 
  private:
     KernelHandle kernel_;
     std::string name_;
+    uint64_t sourceIdentity_;
 };
 
 // Key text to kernel. Nothing is evicted while the device lives.
