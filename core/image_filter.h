@@ -11,6 +11,7 @@
 #include "api/tov/types.h"
 #include "core/context.h"
 #include "core/image.h"
+#include "core/private_copies.h"
 #include "core/registry.h"
 #include "filters/catalogue.h"
 #include "filters/parameter.h"
@@ -79,8 +80,6 @@ class TovImageFilter final : public TovObject {
     TovFilterParameter& byName(std::string_view name);
     bool isFedBy(const TovImageFilter& filter) const;
     void reserveState();
-    void makePrivateCopies(const FilterTree& tree);
-    void copyPrivately(size_t index, const TovImage& image);
 
     DevicePointer device_;
     ObjectRef context_;
@@ -96,5 +95,5 @@ class TovImageFilter final : public TovObject {
     std::vector<std::unique_ptr<TovFilterParameter>> parameters_;
     std::vector<TovFilterParameter*> imageParameters_;
     std::vector<std::unique_ptr<TovFilterPass>> passes_;
-    std::vector<std::unique_ptr<zor::Buffer<char>>> privateCopies_;  // kept between runs for their memory
+    PrivateCopies privateCopies_;
 };

@@ -1,7 +1,4 @@
 // One run of a filter: checks, resources, passes.
-#include <algorithm>
-#include <array>
-
 #include "core/exception.h"
 #include "core/filter_tree.h"
 #include "core/image_checks.h"
@@ -78,37 +75,6 @@ void TovImageFilter::reserveState() {
     createStateBuffer(nullptr, size);
 }
 
-void TovImageFilter::makePrivateCopies(const FilterTree& tree) {
-    std::vector<const TovImage*> copied;
-    for (const AliasedInput& input : aliasedInputs(tree)) {
-        const auto known = std::find(copied.begin(), copied.end(), input.image);
-        const auto index = static_cast<size_t>(known - copied.begin());
-        if (known == copied.end()) {
-            copyPrivately(index, *input.image);
-            copied.push_back(input.image);
-        }
-        input.parameter->setStandIn(input.element, privateCopies_[index].get());
-    }
-    privateCopies_.resize(copied.size());
-}
-
-void TovImageFilter::copyPrivately(size_t index, const TovImage& image) {
-    if (image.isOpenClImage())
-        refuse(TOV_ERROR_UNSUPPORTED, "One OpenCL image cannot be both input and output of this filter");
-    const uint64_t size = image.storage()->size();
-    if (index == privateCopies_.size()) privateCopies_.emplace_back();
-    auto& copy = privateCopies_[index];
-    if (!copy || copy->size() < size) {
-        copy.reset();
-        copy = std::make_unique<zor::Buffer<char>>(*device_, size, zor::BUFFER_DEFAULT);
-    }
-    if (!copy->hasMemory()) {
-        copy.reset();
-        throw TovException{TOV_ERROR_INTERNAL_ERROR};
-    }
-    copy->copyFrom(*image.storage(), size);
-}
-
 void TovImageFilter::apply() {
     TovContext& owner = require<TovContext>(context_);
     const FilterTree tree(*this);
@@ -125,7 +91,7 @@ void TovImageFilter::apply() {
     owner.reserveScratch(spec_.scratchBytesPerPixel * pixelsOf(srcBuffer_));
     reserveState();
     const StandIns standIns(tree);
-    makePrivateCopies(tree);
+    privateCopies_.provide(tree);
 
     const TovImage& output = *dstBuffer_.boundImage();
     const Size limits = {output.width(), output.height()};

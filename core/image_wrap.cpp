@@ -35,6 +35,12 @@ bool isIntegerChannel(cl_channel_type type) noexcept {
     refuse(TOV_ERROR_INVALID_PARAMETER, why);
 }
 
+// An image may be bound as input and as output, so kernels need both kinds of access.
+void requireAccess(cl_mem memory) {
+    if ((memoryInfo<cl_mem_flags>(memory, CL_MEM_FLAGS) & (CL_MEM_READ_ONLY | CL_MEM_WRITE_ONLY)) != 0)
+        refuseMemory("The memory object was created read-only or write-only: kernels need to read and write it");
+}
+
 }  // namespace
 
 void TovImage::requireUsableBuffer(cl_mem memory) const {
@@ -63,6 +69,7 @@ void TovImage::wrapOpenClMemory(cl_mem memory, bool isImage) {
     const uint64_t size = memoryInfo<size_t>(memory, CL_MEM_SIZE);
     if (memoryInfo<cl_context>(memory, CL_MEM_CONTEXT) != device_->getContext())
         refuseMemory("The memory object belongs to another OpenCL context");
+    requireAccess(memory);
     if (isImage) {
         requireUsableImage(memory);
     } else {

@@ -34,6 +34,9 @@ ParameterSpec floatArray(const char* name) {
 PassItem arg(const char* parameter) {
     return {PassItemKind::Argument, parameter};
 }
+PassItem readBack(const char* parameter) {
+    return {PassItemKind::ReadBack, parameter};
+}
 PassItem ownParameters() {
     return {PassItemKind::OwnParameters};
 }
@@ -249,7 +252,7 @@ std::array<FilterSpec, kFilterTypes> makeCatalogue() {
                         floatParameter("depthSigma", 0.1f, "Detection Threshold for depth"),
                         floatParameter("transSigma", 0.1f, "Detection Threshold for transition color values")},
          .rules = {positive("colorSigma"), positive("normalSigma"), positive("depthSigma"), positive("transSigma")},
-         .check = checkSameFormat,
+         .check = checkWaveletImages,
          .passes = {waveletLevel(1, "offset=1"), waveletLevel(2, "offset=2"), waveletLevel(3, "offset=4"),
                     waveletLevel(4, "offset=8"), waveletLevel(5, "offset=16")}},
 
@@ -288,6 +291,7 @@ std::array<FilterSpec, kFilterTypes> makeCatalogue() {
                         floatParameter("colorTreshold", 0.05f, kColorThresholdText),
                         floatParameter("normalTreshold", kCosPiOver8, kNormalThresholdText),
                         floatParameter("depthTreshold", 0.1f, kDepthThresholdText)},
+         .check = checkBuffersOnly,
          .passes = {{.program = "MLAA",
                      .kernel = "EdgeDetectionMLAA",
                      .items = {arg("srcBuffer"), arg("meshIDImg"), arg("normalsImg"), arg("depthImg"), scratch(),
@@ -315,6 +319,7 @@ std::array<FilterSpec, kFilterTypes> makeCatalogue() {
          .stateBytesPerPixel = 112,  // seven four-float slices
          .hasState = true,
          .sizeRule = SizeRule::EqualOutput,
+         .readsOutputBack = true,
          .required = {"positionsImg"},
          .outputs = {"outVarianceImg"},
          .parameters = {imageParameter("positionsImg", kPositionsText),
@@ -323,12 +328,12 @@ std::array<FilterSpec, kFilterTypes> makeCatalogue() {
                         matrixParameter("viewProjMatrix", kViewProjectionText)},
          .passes = {{.program = "TemporalAccumulation",
                      .kernel = "GenerateMotionBuffer",
-                     .items = {arg("positionsImg"), arg("dstBuffer"), viewProjectionPair("viewProjMatrix"),
+                     .items = {arg("positionsImg"), readBack("dstBuffer"), viewProjectionPair("viewProjMatrix"),
                                flag("MOTION_BUFFER")}},
                     {.program = "TemporalAccumulation",
                      .kernel = "TemporalAccumulation",
                      .items = {arg("srcBuffer"), arg("positionsImg"), arg("normalsImg"), arg("meshIdsImg"),
-                               arg("dstBuffer"), arg("outVarianceImg"), arg("dstBuffer"), state(),
+                               readBack("dstBuffer"), arg("outVarianceImg"), arg("dstBuffer"), state(),
                                flag("TEMPORAL_ACCUMULATION")}},
                     {.program = "TemporalAccumulation",
                      .kernel = "SwapOutToIn",

@@ -20,6 +20,7 @@ struct ParameterSpec {
 
 enum class PassItemKind {
     Argument,       // the parameter; an image also defines its layout under the kernel argument's name
+    ReadBack,       // likewise, of an output that a pass writes and a later one reads
     OwnParameters,  // every parameter of the filter, in order, as arguments
     Scratch,        // the context's scratch buffer
     State,          // the filter's state buffer
@@ -83,7 +84,8 @@ struct FilterSpec {
     const std::vector<uint8_t>& (*stateContents)() = nullptr;
     InPlace inPlace = InPlace::PrivateCopy;
     SizeRule sizeRule = SizeRule::CoverOutput;
-    bool fusable = false;  // one pass without memory of its own, in a kernel that keeps to the form of fusion
+    bool readsOutputBack = false;  // see PassItemKind::ReadBack
+    bool fusable = false;          // one pass without memory of its own, in a kernel that keeps to the form of fusion
     std::vector<const char*> required = {};  // image parameters that must be bound, besides input and output
     std::vector<const char*> outputs = {};   // image parameters that are written, besides dstBuffer
     std::vector<ParameterSpec> parameters = {};

@@ -22,13 +22,18 @@ void setBuffer(zor::Launcher& launcher, const zor::BufferBase* buffer) {
     launcher.arg(*buffer);
 }
 
-void setImage(zor::Launcher& launcher, const TovFilterParameter& parameter, uint32_t element) {
+const zor::BufferBase* memoryOf(const TovFilterParameter& parameter, uint32_t element, const TovImage& image,
+                                bool readBack) {
+    const zor::BufferBase* standIn = readBack ? parameter.standIn(kReadBackElement) : parameter.standIn(element);
+    return standIn != nullptr ? standIn : image.storage();
+}
+
+void setImage(zor::Launcher& launcher, const TovFilterParameter& parameter, uint32_t element, bool readBack) {
     TovObject* bound = parameter.boundObject(element);
     if (bound == nullptr) {
         launcher.arg(kAbsentImage);
     } else if (const auto* image = as<TovImage>(bound)) {
-        const zor::BufferBase* standIn = parameter.standIn(element);
-        setBuffer(launcher, standIn != nullptr ? standIn : image->storage());
+        setBuffer(launcher, memoryOf(parameter, element, *image, readBack));
     } else {
         as<TovImageFilter>(bound)->firstPass().SetArguments(launcher, true);
     }
@@ -54,7 +59,7 @@ void TovInternalParameter::SetKernelArgument(zor::Launcher& launcher) {
             break;
         case TOV_PARAMETER_TYPE_IMAGE:
         case TOV_PARAMETER_TYPE_IMAGE_ARRAY:
-            for (uint32_t i = 0; i < parameter_->imageCount(); ++i) setImage(launcher, *parameter_, i);
+            for (uint32_t i = 0; i < parameter_->imageCount(); ++i) setImage(launcher, *parameter_, i, readBack_);
             break;
         default:
             break;  // vectors and matrices reach kernels through derived arguments only

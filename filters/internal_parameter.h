@@ -13,7 +13,9 @@ using StateSlot = std::unique_ptr<zor::Buffer<char>>;
 
 class TovInternalParameter {
  public:
-    explicit TovInternalParameter(TovFilterParameter& parameter) noexcept : parameter_(&parameter) {}
+    // With readBack, an output argument whose content a later pass of the filter reads.
+    explicit TovInternalParameter(TovFilterParameter& parameter, bool readBack = false) noexcept
+        : parameter_(&parameter), readBack_(readBack) {}
     explicit TovInternalParameter(const ScratchHolder& scratch) noexcept : scratch_(&scratch) {}
     // The slot, not the buffer: a replaced buffer is seen.
     explicit TovInternalParameter(const StateSlot& state) noexcept : state_(&state) {}
@@ -33,6 +35,7 @@ class TovInternalParameter {
     TovFilterParameter* parameter_ = nullptr;
 
  private:
+    bool readBack_ = false;
     const ScratchHolder* scratch_ = nullptr;
     const StateSlot* state_ = nullptr;
 };

@@ -20,6 +20,8 @@ using Size = std::array<uint32_t, 2>;  // width and height
 // More elements than a launch has arguments are never of use; a count beyond it is taken for a mistake.
 inline constexpr uint32_t kMaxArrayElements = 64;
 
+inline constexpr uint32_t kReadBackElement = 1;
+
 class TovFilterParameter {
  public:
     // type is one of TOV_PARAMETER_TYPE_...; the value starts as zero, no image or no array. The texts are not copied;
@@ -64,7 +66,8 @@ class TovFilterParameter {
     TovImage* boundImage(uint32_t element = 0) const;         // null also for a filter
     TovImageFilter* boundFilter(uint32_t element = 0) const;  // null also for an image
 
-    // Memory that stands in for a bound image while the filter runs; null for the image's own.
+    // Memory that stands in for a bound image while the filter runs; null for the image's own. kReadBackElement of an
+    // output is what passes write for a later pass to read.
     void setStandIn(uint32_t element, const zor::BufferBase* memory);
     const zor::BufferBase* standIn(uint32_t element) const noexcept;
     void clearStandIns() noexcept { standIns_.clear(); }

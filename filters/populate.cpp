@@ -26,6 +26,9 @@ void addItem(TovImageFilter& filter, TovFilterPass& pass, const PassItem& item) 
         case PassItemKind::Argument:
             pass.addArgument(require(filter, item.name));
             break;
+        case PassItemKind::ReadBack:
+            pass.addArgument(require(filter, item.name), true);
+            break;
         case PassItemKind::OwnParameters:
             addOwnParameters(filter, pass);
             break;

@@ -104,7 +104,16 @@ void checkDragoLuminances(TovImageFilter& filter) {
                                                 ": the maximum luminance must be of the average's order or above it");
 }
 
-void checkSameFormat(TovImageFilter& filter) {
+void checkBuffersOnly(TovImageFilter& filter) {
+    for (const char* name : {"srcBuffer", "dstBuffer"}) {
+        const TovImage* image = filter.find(name)->boundImage();
+        if (image != nullptr && image->isOpenClImage())
+            refuse(TOV_ERROR_UNSUPPORTED, std::string(name) + " of this filter must be a buffer, not an OpenCL image");
+    }
+}
+
+void checkWaveletImages(TovImageFilter& filter) {
+    checkBuffersOnly(filter);
     const TovImage* input = filter.find("srcBuffer")->boundImage();
     const TovImage* output = filter.find("dstBuffer")->boundImage();
     if (input == nullptr || output == nullptr) return;  // an unbound image is refused with the images

@@ -18,5 +18,6 @@ void checkValues(TovImageFilter& filter);
 void checkMathTestBuffers(TovImageFilter& filter);  // input and output are buffers of five floats or more
 void checkBlurSigma(TovImageFilter& filter);        // twice its square is a number that can divide
 void checkDragoLuminances(TovImageFilter& filter);  // their ratio has a logarithm that can divide
-void checkSameFormat(TovImageFilter& filter);       // input and output agree in component type and count
+void checkBuffersOnly(TovImageFilter& filter);      // input and output are no OpenCL images
+void checkWaveletImages(TovImageFilter& filter);    // nor of different component types or counts
 void checkRegressionGroup(TovImageFilter& filter);  // the device runs groups of 8 x 8

@@ -46,9 +46,9 @@ TovFilterPass::TovFilterPass(TovContext& context, const char* sourceName, const 
       sizeParameter_(sizeParameter),
       grid2D_(grid2D) {}
 
-void TovFilterPass::addArgument(TovFilterParameter& parameter) {
+void TovFilterPass::addArgument(TovFilterParameter& parameter, bool readBack) {
     const size_t position = arguments_.size();
-    arguments_.push_back(std::make_unique<TovInternalParameter>(parameter));
+    arguments_.push_back(std::make_unique<TovInternalParameter>(parameter, readBack));
     if (!parameter.isImageLike()) return;
     addParameterDefine(position < code_.arguments.size() ? code_.arguments[position].name : std::string(), parameter);
 }

@@ -20,8 +20,8 @@ class TovFilterPass {
     // ---- Filling by the catalogue ----
 
     // Appends the parameter as the next argument, and the layout definitions of its images under the name that the
-    // kernel has at the same position.
-    void addArgument(TovFilterParameter& parameter);
+    // kernel has at the same position. readBack: see TovInternalParameter.
+    void addArgument(TovFilterParameter& parameter, bool readBack = false);
     void addScratchArgument() { arguments_.push_back(std::make_unique<TovInternalParameter>(context_.scratch())); }
     void addStateArgument(const StateSlot& state) {
         arguments_.push_back(std::make_unique<TovInternalParameter>(state));
