@@ -62,9 +62,7 @@ std::string printedBy(Body&& body) {
 
 class DeviceTest : public testing::Test {
  protected:
-    void SetUp() override {
-        ASSERT_NE(context(), nullptr) << "these tests need an OpenCL device of type CPU";
-    }
+    void SetUp() override { ASSERT_NE(context(), nullptr) << "these tests need an OpenCL device of type CPU"; }
 
     // One context for the whole program; compiled kernels are shared by all suites.
     static tov_context context();

@@ -104,7 +104,6 @@ TEST_F(ObjectLifetime, DeletedArrayElementsAndOptionalImagesGiveTheImageCode) {
     Handle element = newImage(noise(7, 5));
     std::vector<tov_image> elements = {image, element};
     const Handle product = newFilter(TOV_IMAGE_FILTER_MULTIPLY, {{"inputsNum", 2u}});
-    ASSERT_EQ(setParameter(product, {"inputs", elements}), TOV_SUCCESS);
     ASSERT_EQ(tovImageFilterSetParameterImageArray(product, "inputs", elements.data(), 2), TOV_SUCCESS);
     Handle normals = newImage(noise(7, 5));
     const Handle wavelets = newFilter(TOV_IMAGE_FILTER_EAW_DENOISE, {{"normalsImg", tov_image{normals}}});

@@ -140,8 +140,7 @@ Picture noise(uint32_t width, uint32_t height, Layout layout, double scale, uint
 }
 
 Picture mapped(const Picture& input, Layout layout, const std::function<Rgba(const Rgba&)>& function) {
-    return painted(input.width, input.height, layout,
-                   [&](uint32_t x, uint32_t y) { return function(input.at(x, y)); });
+    return painted(input.width, input.height, layout, [&](uint32_t x, uint32_t y) { return function(input.at(x, y)); });
 }
 
 double maxDifference(const Picture& a, const Picture& b) {
