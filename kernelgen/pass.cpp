@@ -88,7 +88,8 @@ zor::Kernel* TovFilterPass::findKernel() const {
                                          .options = options,
                                          .sources = sources,
                                          .dependencies = {},
-                                         .keepInCache = true});
+                                         .keepInCache = true,
+                                         .writeAfterRun = true});
 }
 
 // The fixed options of a single kernel are left out: the generated text carries every definition. A file of the shared
@@ -109,7 +110,8 @@ zor::Kernel* TovFilterPass::findFusedKernel(TovImageFilter& root) const {
                                          .sources = isOnDisk ? std::span<const std::string_view>(included) : embedded,
                                          .dependencies = dependencies,
                                          .keepInCache = true,
-                                         .generatedSources = true});
+                                         .generatedSources = true,
+                                         .writeAfterRun = true});
 }
 
 void TovFilterPass::Execute(TovImageFilter* fusedRoot, const Size& limits) {

@@ -10,13 +10,6 @@
 
 namespace zor {
 
-// A cache file and what its content must agree with.
-struct CacheEntry {
-    std::string path;       // of the binary
-    std::string options;    // as given to the compiler
-    uint64_t identity = 0;  // hash of everything else that the binary depends on
-};
-
 // 64-bit FNV-1a (Fowler, Noll, Vo) over the bytes of a text, continuing from hash.
 inline constexpr uint64_t kFnvOffset = 14695981039346656037u;
 uint64_t fnv1a(std::string_view text, uint64_t hash = kFnvOffset) noexcept;

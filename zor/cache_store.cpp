@@ -39,6 +39,19 @@ uint64_t processNumber() noexcept {
 #endif
 }
 
+std::string programBinary(cl_program program) {
+    size_t size = 0;
+    check(cl().clGetProgramInfo(program, cl_program_info{CL_PROGRAM_BINARY_SIZES}, sizeof size, &size, nullptr),
+          "clGetProgramInfo");
+    std::string binary(size, '\0');
+    char* bytes = binary.data();
+    if (size > 0) {
+        check(cl().clGetProgramInfo(program, cl_program_info{CL_PROGRAM_BINARIES}, sizeof bytes, &bytes, nullptr),
+              "clGetProgramInfo");
+    }
+    return binary;
+}
+
 void removeFile(const std::string& path) noexcept {
     std::error_code ignored;
     fs::remove(path, ignored);
@@ -114,6 +127,11 @@ bool storeBinary(const CacheEntry& entry, const std::string& binary) {
     if (program.renameTo(entry.path)) return true;
     removeFile(sidePath(entry));
     return false;
+}
+
+void writeProgram(cl_program program, const CacheEntry& entry) {
+    const std::string binary = programBinary(program);
+    if (!binary.empty() && storeBinary(entry, binary)) std::printf("Cached file created %s\n", entry.path.c_str());
 }
 
 void removeBinary(const CacheEntry& entry) noexcept {

@@ -17,6 +17,9 @@ std::optional<std::string> loadBinary(const CacheEntry& entry);
 // Writes both files under temporary names and renames them. False when that fails; then nothing is left behind.
 bool storeBinary(const CacheEntry& entry, const std::string& binary);
 
+// Stores a program's binary as the driver has it now, and prints a line; what cannot be stored is silently not cached.
+void writeProgram(cl_program program, const CacheEntry& entry);
+
 void removeBinary(const CacheEntry& entry) noexcept;
 
 // The whole of a regular file.

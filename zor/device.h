@@ -55,6 +55,9 @@ struct KernelRequest {
     bool keepInCache = true;                           // may reuse the map's kernel and the cached binary
     // The texts differ from request to request: an option text that only holds their hash does not tell them apart.
     bool generatedSources = false;
+    // Write a compiled program to the cache when the kernel has run, not at once: drivers that compile for the group
+    // size of a launch then put that, too, into the binary, and a later process has nothing left to compile.
+    bool writeAfterRun = false;
 };
 
 // All text operations write at most kDeviceTextBytes bytes, zero-terminated.

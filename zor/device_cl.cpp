@@ -225,7 +225,9 @@ Kernel* DeviceCL::getKernel(const KernelRequest& request) {
     std::string name(request.kernelName);
     KernelHandle handle = createKernel(builder.program(), name);
     if (handle == nullptr) return nullptr;
-    return kernels_->insert(std::move(mapName), std::make_unique<Kernel>(std::move(handle), std::move(name), identity));
+    auto kernel = std::make_unique<Kernel>(std::move(handle), std::move(name), identity);
+    kernel->setUnwritten(builder.takeUnwritten());
+    return kernels_->insert(std::move(mapName), std::move(kernel));
 }
 
 uint64_t DeviceCL::queryGlobalMemorySize() const {

@@ -1,6 +1,9 @@
 #include "zor/kernel.h"
 
 #include <algorithm>
+#include <utility>
+
+#include "zor/cache_store.h"
 
 namespace zor {
 namespace {
@@ -16,6 +19,12 @@ uint64_t localSizeWithin(int32_t wished, uint32_t limit) noexcept {
 }
 
 }  // namespace
+
+void Kernel::hasRun() {
+    if (!unwritten_) return;
+    const UnwrittenProgram written = std::move(*std::exchange(unwritten_, std::nullopt));
+    writeProgram(written.program.get(), written.entry);
+}
 
 Kernel* KernelManager::find(const std::string& mapName) const {
     const auto found = kernels_.find(mapName);
@@ -53,6 +62,7 @@ void Launcher::launch2D(int32_t globalX, int32_t globalY, int32_t localX, int32_
                                       cl_uint{0}, nullptr, nullptr),
           "clEnqueueNDRangeKernel");
     device_.finish();
+    kernel_.hasRun();
 }
 
 void Launcher::setNext(const void* value, size_t size) {

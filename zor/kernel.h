@@ -5,11 +5,13 @@
 #include <cstdint>
 #include <map>
 #include <memory>
+#include <optional>
 #include <string>
 #include <type_traits>
 
 #include "zor/buffer.h"
 #include "zor/device_cl.h"
+#include "zor/kernel_builder.h"
 
 namespace zor {
 
@@ -27,10 +29,15 @@ class Kernel {
     const std::string& name() const noexcept { return name_; }
     uint64_t sourceIdentity() const noexcept { return sourceIdentity_; }
 
+    // A program to be written to the cache by the first hasRun(), which a launcher calls after each launch.
+    void setUnwritten(std::optional<UnwrittenProgram> program) noexcept { unwritten_ = std::move(program); }
+    void hasRun();
+
  private:
     KernelHandle kernel_;
     std::string name_;
     uint64_t sourceIdentity_;
+    std::optional<UnwrittenProgram> unwritten_;
 };
 
 // Key text to kernel. Nothing is evicted while the device lives.

@@ -1,6 +1,7 @@
 #include "zor/kernel_builder.h"
 
 #include <cstdio>
+#include <utility>
 #include <vector>
 
 #include "zor/cache_name.h"
@@ -23,19 +24,6 @@ bool allUpToDate(const std::string& binary, std::span<const std::string_view> de
     return true;
 }
 
-std::string programBinary(cl_program program) {
-    size_t size = 0;
-    check(cl().clGetProgramInfo(program, cl_program_info{CL_PROGRAM_BINARY_SIZES}, sizeof size, &size, nullptr),
-          "clGetProgramInfo");
-    std::string binary(size, '\0');
-    char* bytes = binary.data();
-    if (size > 0) {
-        check(cl().clGetProgramInfo(program, cl_program_info{CL_PROGRAM_BINARIES}, sizeof bytes, &bytes, nullptr),
-              "clGetProgramInfo");
-    }
-    return binary;
-}
-
 }  // namespace
 
 void KernelBuilder::buildFromSources(const KernelRequest& request) {
@@ -51,7 +39,7 @@ void KernelBuilder::buildFromSources(const KernelRequest& request) {
     }
     if (request.keepInCache && current && load(entry)) return;
     compile(request.sources, entry.options);
-    store(entry);
+    store(std::move(entry), request.writeAfterRun);
 }
 
 bool KernelBuilder::buildFromFile(const KernelRequest& request, bool addExtension) {
@@ -75,7 +63,7 @@ bool KernelBuilder::buildFromFile(const KernelRequest& request, bool addExtensio
     }
     const std::string_view text = *source;
     compile({&text, 1}, entry.options);
-    store(entry);
+    store(std::move(entry), request.writeAfterRun);
     return true;
 }
 
@@ -119,10 +107,18 @@ void KernelBuilder::compile(std::span<const std::string_view> sources, const std
     program_ = std::move(program);
 }
 
-void KernelBuilder::store(const CacheEntry& entry) const {
+void KernelBuilder::store(CacheEntry entry, bool afterRun) {
     if (program_ == nullptr || entry.path.empty()) return;
-    const std::string binary = programBinary(program_.get());
-    if (!binary.empty() && storeBinary(entry, binary)) std::printf("Cached file created %s\n", entry.path.c_str());
+    if (afterRun) {
+        unwritten_ = std::move(entry);
+    } else {
+        writeProgram(program_.get(), entry);
+    }
+}
+
+std::optional<UnwrittenProgram> KernelBuilder::takeUnwritten() {
+    if (!unwritten_) return std::nullopt;
+    return UnwrittenProgram{std::move(program_), std::move(*std::exchange(unwritten_, std::nullopt))};
 }
 
 void KernelBuilder::reportBuildFailure(cl_program program, int32_t status) const {

@@ -27,7 +27,18 @@ std::string binaryFileName(const DeviceCL& device, std::string_view fileName, st
 // opened.
 bool isFileUpToDate(const std::string& binary, const std::string& source);
 
-struct CacheEntry;
+// A cache file and what its content must agree with.
+struct CacheEntry {
+    std::string path;       // of the binary; empty: not cached
+    std::string options;    // as given to the compiler
+    uint64_t identity = 0;  // hash of everything else that the binary depends on
+};
+
+// A compiled program whose binary is not in the cache yet.
+struct UnwrittenProgram {
+    ProgramHandle program;
+    CacheEntry entry;
+};
 
 class KernelBuilder {
  public:
@@ -43,14 +54,18 @@ class KernelBuilder {
     // Null after a failed compilation, whose log has been printed.
     cl_program program() const noexcept { return program_.get(); }
 
+    // Gives the program away when it was compiled for a request that writes it after its first run.
+    std::optional<UnwrittenProgram> takeUnwritten();
+
  private:
     bool load(const CacheEntry& entry);
     void compile(std::span<const std::string_view> sources, const std::string& options);
-    void store(const CacheEntry& entry) const;
+    void store(CacheEntry entry, bool afterRun);
     void reportBuildFailure(cl_program program, int32_t status) const;
 
     DeviceCL& device_;
     ProgramHandle program_;
+    std::optional<CacheEntry> unwritten_;
 };
 
 }  // namespace zor
