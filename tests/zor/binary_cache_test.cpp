@@ -125,6 +125,20 @@ TEST_F(BinaryCache, WithoutKeepInCacheTheBinaryIsWrittenButNotRead) {
     EXPECT_FALSE(compiles());
 }
 
+TEST_F(BinaryCache, AProgramToBeWrittenAfterItsRunIsWrittenByTheFirstLaunchThatSucceeds) {
+    zor::Kernel* const kernel = device->getKernel(
+        {.fileName = fileName, .kernelName = "k", .options = " -D A", .sources = {&source, 1}, .writeAfterRun = true});
+    ASSERT_NE(kernel, nullptr);
+    const auto launch = [&] { zor::Launcher(*device, *kernel).launch2D(8, 8, 8, 8); };
+    driver().fail("clEnqueueNDRangeKernel", CL_OUT_OF_RESOURCES);
+    EXPECT_THROW(launch(), zor::Error);
+    EXPECT_THAT(cacheFiles(), IsEmpty());
+    EXPECT_EQ(printed(launch), "Cached file created cache/" + binary().filename().string() + "\n");
+    EXPECT_EQ(printed(launch), "");
+    EXPECT_EQ(driver().liveObjects("program"), 0u) << "the kernel alone keeps its program alive again";
+    EXPECT_FALSE(compiles());
+}
+
 TEST_F(BinaryCache, ADeletedDirectoryIsMadeAgain) {
     EXPECT_TRUE(compiles());
     fs::remove_all("cache");
