@@ -82,11 +82,13 @@ void addRun(CLI::App& app, RawArguments& raw) {
     run->footer(kRunFooter);
 }
 
-// CLI11 would only say that a name was not expected.
+// CLI11 would only say that a subcommand is required, or that a name was not expected.
 void refuseUnknownCommand(const CLI::App& app, int argc, const char* const* argv) {
-    if (argc < 2 || argv[1][0] == '-') return;
     std::vector<std::string> names;
     for (const CLI::App* const command : app.get_subcommands({})) names.push_back(command->get_name());
+    if (argc < 2)
+        throw usageFailure("the command is missing; the commands are " + join(names, ", ") + "; see tov --help");
+    if (argv[1][0] == '-') return;
     if (std::ranges::find(names, argv[1]) != names.end()) return;
     throw usageFailure("there is no command \"" + std::string(argv[1]) + "\"" + suggestion(argv[1], names) +
                        "; the commands are " + join(names, ", "));

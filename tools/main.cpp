@@ -37,6 +37,7 @@ void execute(Streams& streams, const RunCommand& command) {
     const std::string cache = cacheDirectory(command.cache);
     const DeviceChoice device = chooseDevice(command.device);
     const Handle context = openDevice(device, cache.c_str());
+    streams.forgetLibraryLines();
     const std::vector<PreparedStage> stages = prepareStages(context.get(), command.stages);
     Picture picture = readPicture(command.input);
     if (command.verbose) {

@@ -56,11 +56,12 @@ void refuseWhatIsNoPicture(const std::string& path, const OIIO::ImageSpec& spec)
     if (spec.deep) throw unreadable(path, "it holds deep samples, which have to be flattened first");
     if (spec.depth > 1) throw unreadable(path, "it holds a volume, not a picture");
     if (spec.width <= 0 || spec.height <= 0 || spec.nchannels <= 0) throw unreadable(path, "it has no pixels");
+    constexpr uint64_t kPixelBytes = kComponents * sizeof(float);
     constexpr uint64_t kMaxImageBytes = std::numeric_limits<uint32_t>::max();
-    const uint64_t bytes =
-        static_cast<uint64_t>(spec.width) * static_cast<uint64_t>(spec.height) * (kComponents * sizeof(float));
-    if (bytes <= kMaxImageBytes) return;
-    throw Failure(ExitStatus::kFailed, "the picture is too big for the device: " + std::to_string(spec.width) + " x " +
+    const uint64_t pixels = static_cast<uint64_t>(spec.width) * static_cast<uint64_t>(spec.height);
+    if (pixels <= kMaxImageBytes / kPixelBytes) return;
+    const uint64_t bytes = std::min(pixels, std::numeric_limits<uint64_t>::max() / kPixelBytes) * kPixelBytes;
+    throw Failure(ExitStatus::kFailed, "the picture is too big for any device: " + std::to_string(spec.width) + " x " +
                                            std::to_string(spec.height) + " pixels need images of " +
                                            std::to_string(bytes) + " bytes; at most " + std::to_string(kMaxImageBytes) +
                                            " are available to one");
@@ -93,9 +94,10 @@ void readPixels(OIIO::ImageInput& input, const std::string& path, const std::vec
     const auto [first, last] = std::ranges::minmax(indices);
     const auto stride = static_cast<size_t>(last - first + 1);
     std::vector<float> stored(picture.pixelCount() * stride);
-    if (!input.read_image(0, 0, first, last + 1, OIIO::TypeDesc::FLOAT, stored.data())) {
-        throw unreadable(path, oneLine(input.geterror()));
-    }
+    input.geterror();  // forget what opening left
+    const bool read = input.read_image(0, 0, first, last + 1, OIIO::TypeDesc::FLOAT, stored.data());
+    // Some readers fill what is missing of a damaged file, report success and leave only an error text.
+    if (!read || input.has_error()) throw unreadable(path, oneLine(input.geterror()));
     std::vector<int> offsets = indices;
     for (int& offset : offsets) offset -= first;
     picture.pixels.resize(picture.pixelCount() * kComponents);

@@ -56,7 +56,11 @@ Output createOutput(const std::string& path) {
     throw unwritable(path, wrong + "; known are " + writableExtensions());
 }
 
-const std::string& refuseUnknownExtension(const std::string& path) {
+const std::string& refuseImpossible(const std::string& path) {
+    std::error_code ignored;
+    if (path.ends_with('/') || std::filesystem::is_directory(path, ignored)) {
+        throw unwritable(path, "it is a directory");
+    }
     createOutput(path);
     return path;
 }
@@ -154,7 +158,7 @@ bool writePixels(OIIO::ImageOutput& output, OIIO::TypeDesc type, const std::vect
 
 }  // namespace
 
-PictureWriter::PictureWriter(const std::string& path) : name_(path), file_(refuseUnknownExtension(path)) {}
+PictureWriter::PictureWriter(const std::string& path) : name_(path), file_(refuseImpossible(path)) {}
 
 void PictureWriter::write(const Picture& picture) {
     const Output output = createOutput(file_.path());

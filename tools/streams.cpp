@@ -91,6 +91,11 @@ void Streams::showLibraryLines() {
     pending_.clear();
 }
 
+void Streams::forgetLibraryLines() {
+    takeLibraryLines();
+    pending_.clear();
+}
+
 void complain(std::string_view text) {
     writeAll(STDERR_FILENO, "tov: " + std::string(text) + "\n");
 }

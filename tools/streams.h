@@ -29,6 +29,8 @@ class Streams {
     std::string takeLibraryLines();
     // Everything held back goes to standard error.
     void showLibraryLines();
+    // What was printed so far belongs to no failure: unless verbose, it is not shown any more.
+    void forgetLibraryLines();
 
  private:
     std::string collect();
