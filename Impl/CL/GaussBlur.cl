@@ -1,13 +1,17 @@
 // Separable Gaussian blur: a horizontal pass from the input into four floats per pixel, and a vertical pass from there
 // into the output. Borders mirror the picture, the edge pixels repeated.
 //
-// Definitions: cRadius, COEFFS (the 2 * cRadius + 1 weights in braces), TILED. Launches are one-dimensional in groups
-// of 32. The tiled passes stage a group's pixels and their halo in local memory. In the order of the pass, row after row
-// or column after column, every pixel that a group's sums need lies within cRadius places of the group: reflection
-// never leads farther from a pixel than the offset that it reflects.
+// Definitions: cRadius, COEFFS (the 2 * cRadius + 1 weights in braces), TILED. Launches are one-dimensional over all
+// pixels, in groups of 32. How a pass uses its items depends on the device:
+// - Central processors have a cache instead of local memory, and vectors within one item. There every 32nd item blurs
+//   32 pixels, tiled or not.
+// - Other devices blur a pixel per item. Tiled, a group stages its pixels and their halo in local memory. In the order
+//   of the pass, row after row or column after column, every pixel that a group's sums need lies within cRadius places
+//   of the group: reflection never leads farther from a pixel than the offset that it reflects.
 
 #define BLOCK_SIZE 32
 #define TILEWIDTH (BLOCK_SIZE + 2 * cRadius)
+#define TAPS (2 * cRadius + 1)
 
 // Beyond a radius of one group the halo costs more than it saves.
 #if TILED != 0 && cRadius <= BLOCK_SIZE
@@ -16,11 +20,188 @@
 #define USE_TILE 0
 #endif
 
-__constant float kCoefficients[] = COEFFS;
+__constant float kCoefficients[TAPS] = COEFFS;
+
+#if ON_CENTRAL_PROCESSOR
+
+// ---- Blocks of 32 pixels per item ----------------------------------------------------------------------------------
+
+// A block is 32 pixels of a row, or 8 columns of 4 rows. Sums are kept of 16 pixels at a time: as many as fit into the
+// registers beside the weight.
+#define PIXELS_AT_A_TIME 16
+#define BLOCK_COLUMNS 8
+#define BLOCK_ROWS 4
+
+// Pixels are staged for as many taps at a time, so that private memory has a bound for any radius.
+#define STAGED_TAPS (TAPS < 512 ? TAPS : 512)
+
+// Four neighbouring pixels in memory, aligned as one. Read through pointers: vectors of this size as the values of
+// functions draw warnings on processors without registers as wide.
+typedef float16 __attribute__((aligned(16))) FourPixels;
+
+// Adds to the sums of 16 neighbouring pixels; `window` begins at the first pixel's first tap.
+static inline void AddTaps(float16* sums, const float4* window, int first_tap, int taps) {
+    float16 sum0 = sums[0];
+    float16 sum1 = sums[1];
+    float16 sum2 = sums[2];
+    float16 sum3 = sums[3];
+    for (int i = 0; i < taps; ++i) {
+        const float weight = kCoefficients[first_tap + i];
+        const FourPixels* pixels = (const FourPixels*)(window + i);
+        sum0 += pixels[0] * weight;
+        sum1 += pixels[1] * weight;
+        sum2 += pixels[2] * weight;
+        sum3 += pixels[3] * weight;
+    }
+    sums[0] = sum0;
+    sums[1] = sum1;
+    sums[2] = sum2;
+    sums[3] = sum3;
+}
+
+__kernel void GaussBlurHorKernel(srcBufferType(srcBuffer), dst_float_4 dstBuffer) {
+    const int2 size = GET_BUFFER_SIZE(dstBuffer);
+    const uint count = (uint)size.x * (uint)size.y;
+    uint place = (uint)get_global_id(0);
+    if (place % BLOCK_SIZE != 0 || place >= count) {
+        return;
+    }
+    const uint behind = min(place + BLOCK_SIZE, count);
+    // The block as runs of pixels in one row each.
+    while (place < behind) {
+        const int row = (int)(place / (uint)size.x);
+        const int column = (int)(place % (uint)size.x);
+        const int run = min((int)(behind - place), size.x - column);
+        const int parts = (run + PIXELS_AT_A_TIME - 1) / PIXELS_AT_A_TIME;
+        float4 window[BLOCK_SIZE + STAGED_TAPS];
+        float16 sums[BLOCK_SIZE / 4];
+        for (int i = 0; i < BLOCK_SIZE / 4; ++i) {
+            sums[i] = (float16)(0.0f);
+        }
+        for (int tap = 0; tap < TAPS; tap += STAGED_TAPS) {
+            const int taps = min(STAGED_TAPS, TAPS - tap);
+            const int first = column - cRadius + tap;
+            const int staged = parts * PIXELS_AT_A_TIME + taps - 1;
+            if (first >= 0 && first + staged <= size.x) {
+                for (int i = 0; i < staged; ++i) {
+                    window[i] = ReadPixel(srcBuffer, first + i, row);
+                }
+            } else {
+                for (int i = 0; i < staged; ++i) {
+                    window[i] = ReadPixel(srcBuffer, MirrorCoordinate(first + i, size.x), row);
+                }
+            }
+            for (int part = 0; part < parts; ++part) {
+                AddTaps(sums + 4 * part, window + PIXELS_AT_A_TIME * part, tap, taps);
+            }
+        }
+        const float4* values = (const float4*)sums;
+        for (int i = 0; i < run; ++i) {
+            WritePixel_float_4(dstBuffer, size, column + i, row, values[i]);
+        }
+        place += (uint)run;
+    }
+}
+
+// The sums of 4 columns by 4 rows, a row after the other. Each row that is read serves all four.
+static inline void SumRows(float16* sums, __global const float4* srcBuffer, int2 size, int column, int row) {
+    float16 sum0 = (float16)(0.0f);
+    float16 sum1 = (float16)(0.0f);
+    float16 sum2 = (float16)(0.0f);
+    float16 sum3 = (float16)(0.0f);
+    __global const float4* top = srcBuffer + column;
+#define READ_ROW(tap) \
+    *(__global const FourPixels*)(top + PixelIndex(size, 0, MirrorCoordinate(row - cRadius + (tap), size.y)))
+#define ADD_ROW(n)                              \
+    if (tap - n >= 0 && tap - n < TAPS) {       \
+        sum##n += pixels * kCoefficients[tap - n]; \
+    }
+    for (int tap = 0; tap < BLOCK_ROWS - 1; ++tap) {
+        const float16 pixels = READ_ROW(tap);
+        ADD_ROW(0)
+        ADD_ROW(1)
+        ADD_ROW(2)
+    }
+    for (int tap = BLOCK_ROWS - 1; tap < TAPS; ++tap) {
+        const float16 pixels = READ_ROW(tap);
+        sum0 += pixels * kCoefficients[tap];
+        sum1 += pixels * kCoefficients[tap - 1];
+        sum2 += pixels * kCoefficients[tap - 2];
+        sum3 += pixels * kCoefficients[tap - 3];
+    }
+    for (int tap = max(TAPS, BLOCK_ROWS - 1); tap < TAPS + BLOCK_ROWS - 1; ++tap) {
+        const float16 pixels = READ_ROW(tap);
+        ADD_ROW(0)
+        ADD_ROW(1)
+        ADD_ROW(2)
+        ADD_ROW(3)
+    }
+#undef READ_ROW
+#undef ADD_ROW
+    sums[0] = sum0;
+    sums[1] = sum1;
+    sums[2] = sum2;
+    sums[3] = sum3;
+}
+
+static inline float4 SumColumn(__global const float4* srcBuffer, int2 size, int column, int row) {
+    float4 sum = (float4)(0.0f);
+    for (int i = 0; i < TAPS; ++i) {
+        const int tap_row = MirrorCoordinate(row - cRadius + i, size.y);
+        sum += ReadPixel_float_4(srcBuffer, size, column, tap_row) * kCoefficients[i];
+    }
+    return sum;
+}
+
+// Blocks follow each other down strips of 8 columns, so that a block finds the rows of the one before in the cache. The
+// last strip is as narrow as the width leaves it.
+__kernel void GaussBlurVertKernel(src_float_4 srcBuffer, dstBufferType(dstBuffer)) {
+    const int2 size = GET_BUFFER_SIZE(dstBuffer);
+    const uint count = (uint)size.x * (uint)size.y;
+    const uint first = (uint)get_global_id(0);
+    if (first % BLOCK_SIZE != 0 || first >= count) {
+        return;
+    }
+    const uint behind = min(first + BLOCK_SIZE, count);
+    const uint strip = first / (uint)(BLOCK_COLUMNS * size.y);
+    const int first_row = (int)(first / BLOCK_COLUMNS - strip * (uint)size.y);
+    const int first_column = (int)strip * BLOCK_COLUMNS;
+    if (first_column + BLOCK_COLUMNS <= size.x && first_row + BLOCK_ROWS <= size.y) {
+        for (int column = first_column; column < first_column + BLOCK_COLUMNS; column += 4) {
+            float16 sums[BLOCK_ROWS];
+            SumRows(sums, srcBuffer, size, column, first_row);
+            const float4* values = (const float4*)sums;
+            for (int i = 0; i < 4 * BLOCK_ROWS; ++i) {
+                WritePixel(dstBuffer, column + i % 4, first_row + i / 4, values[i]);
+            }
+        }
+        return;
+    }
+    // Blocks at the end of a strip and in the narrow one.
+    for (uint place = first; place < behind; ++place) {
+        const uint own_strip = place / (uint)(BLOCK_COLUMNS * size.y);
+        const int left = (int)own_strip * BLOCK_COLUMNS;
+        const uint width = (uint)min(BLOCK_COLUMNS, size.x - left);
+        const uint inside = place - own_strip * (uint)(BLOCK_COLUMNS * size.y);
+        const int column = left + (int)(inside % width);
+        const int row = (int)(inside / width);
+        WritePixel(dstBuffer, column, row, SumColumn(srcBuffer, size, column, row));
+    }
+}
+
+#else
+
+// ---- One pixel per item --------------------------------------------------------------------------------------------
 
 #if USE_TILE
 static inline float4 SumOfTile(__local const float4* tile, int local_index, int position, int size) {
     float4 sum = (float4)(0.0f);
+    if (position >= cRadius && position + cRadius < size) {
+        for (int i = 0; i < TAPS; ++i) {
+            sum += tile[local_index + i] * kCoefficients[i];
+        }
+        return sum;
+    }
     for (int i = -cRadius; i <= cRadius; ++i) {
         const int step = MirrorCoordinate(position + i, size) - position;
         sum += tile[local_index + cRadius + step] * kCoefficients[i + cRadius];
@@ -35,18 +216,19 @@ __kernel void GaussBlurHorKernel(srcBufferType(srcBuffer), dst_float_4 dstBuffer
     __local float4 tile[TILEWIDTH];
     // A device that cannot run groups of 32 blurs without the tile; the choice is the same for all items.
     if (get_local_size(0) == BLOCK_SIZE) {
-        const long count = (long)size.x * (long)size.y;
-        const long id = (long)get_global_id(0);
+        const int count = size.x * size.y;
+        const int id = (int)get_global_id(0);
         const int local_index = (int)get_local_id(0);
         for (int i = local_index; i < TILEWIDTH; i += BLOCK_SIZE) {
-            const long place = clamp(id - local_index + i - cRadius, 0L, count - 1);
-            tile[i] = ReadPixel(srcBuffer, (int)(place % size.x), (int)(place / size.x));
+            // Launches stay below 2^31 items, their halo may not.
+            const int place = (int)clamp((long)id - local_index + i - cRadius, 0L, (long)count - 1);
+            tile[i] = ReadPixel(srcBuffer, place % size.x, place / size.x);
         }
         barrier(CLK_LOCAL_MEM_FENCE);
         if (id < count) {
-            const int column = (int)(id % size.x);
+            const int column = id % size.x;
             const float4 sum = SumOfTile(tile, local_index, column, size.x);
-            WritePixel_float_4(dstBuffer, size, column, (int)(id / size.x), sum);
+            WritePixel_float_4(dstBuffer, size, column, id / size.x, sum);
         }
         return;
     }
@@ -66,18 +248,18 @@ __kernel void GaussBlurVertKernel(src_float_4 srcBuffer, dstBufferType(dstBuffer
 #if USE_TILE
     __local float4 tile[TILEWIDTH];
     if (get_local_size(0) == BLOCK_SIZE) {
-        const long count = (long)size.x * (long)size.y;
-        const long id = (long)get_global_id(0);
+        const int count = size.x * size.y;
+        const int id = (int)get_global_id(0);
         const int local_index = (int)get_local_id(0);
         for (int i = local_index; i < TILEWIDTH; i += BLOCK_SIZE) {
-            const long place = clamp(id - local_index + i - cRadius, 0L, count - 1);
-            tile[i] = ReadPixel_float_4(srcBuffer, size, (int)(place / size.y), (int)(place % size.y));
+            const int place = (int)clamp((long)id - local_index + i - cRadius, 0L, (long)count - 1);
+            tile[i] = ReadPixel_float_4(srcBuffer, size, place / size.y, place % size.y);
         }
         barrier(CLK_LOCAL_MEM_FENCE);
         if (id < count) {
-            const int row = (int)(id % size.y);
+            const int row = id % size.y;
             const float4 sum = SumOfTile(tile, local_index, row, size.y);
-            WritePixel(dstBuffer, (int)(id / size.y), row, sum);
+            WritePixel(dstBuffer, id / size.y, row, sum);
         }
         return;
     }
@@ -91,3 +273,5 @@ __kernel void GaussBlurVertKernel(src_float_4 srcBuffer, dstBufferType(dstBuffer
     }
     WritePixel(dstBuffer, coord.x, coord.y, sum);
 }
+
+#endif

@@ -7,6 +7,14 @@
 
 #define EXPAND(arg) arg
 
+// 1 on central processors, where vectors within an item and the cache do what items side by side and local memory do
+// elsewhere: a kernel may have a body for each.
+#if defined(__x86_64__) || defined(__i386__) || defined(__aarch64__) || defined(__arm__)
+#define ON_CENTRAL_PROCESSOR 1
+#else
+#define ON_CENTRAL_PROCESSOR 0
+#endif
+
 // REPEAT(N, X) is X(0) X(1) ... X(N - 1).
 #define REPEAT_0(X)
 #define REPEAT_1(X) X(0)
@@ -333,7 +341,7 @@ static inline float4 PowerOfTwo(int4 n) {
 
 // Logarithms of positive, normal numbers and powers of two from -126 to 127. Graphics processors have instructions for
 // both; on central processors the polynomials take a fraction of the library functions' time.
-#if defined(__x86_64__) || defined(__i386__) || defined(__aarch64__) || defined(__arm__)
+#if ON_CENTRAL_PROCESSOR
 static inline float4 Log2(float4 value) {
     float4 exponent;
     const float4 f = SplitMantissa(value, &exponent);
