@@ -91,12 +91,13 @@ struct Launch {
 struct State {
     // What the machine offers. Without platforms clGetPlatformIDs gives -1001.
     std::vector<Platform> platforms;
-    bool refuseBinaries = false;   // clCreateProgramWithBinary gives CL_INVALID_BINARY
-    bool failBuilds = false;       // clBuildProgram gives CL_BUILD_PROGRAM_FAILURE; so does a source with "#error"
-    std::string buildLog;          // of a failed build
-    bool hasGlContextInfo = true;  // clGetGLContextInfoKHR can be found
-    size_t glDevice = 0;           // the device that it names, counted over all platforms
-    uint64_t queueThread = 0;      // answers the vendor-specific queue query 0x403E
+    bool refuseBinaries = false;    // clCreateProgramWithBinary gives CL_INVALID_BINARY
+    bool failBuilds = false;        // clBuildProgram gives CL_BUILD_PROGRAM_FAILURE; so does a source with "#error"
+    bool ignoreErrorLines = false;  // builds it all the same: the conditions around "#error" are not evaluated
+    std::string buildLog;           // of a failed build
+    bool hasGlContextInfo = true;   // clGetGLContextInfoKHR can be found
+    size_t glDevice = 0;            // the device that it names, counted over all platforms
+    uint64_t queueThread = 0;       // answers the vendor-specific queue query 0x403E
     std::function<void(const Launch&)> onLaunch;  // called at each launch, may read and write bytesOf()
 
     // What happened.

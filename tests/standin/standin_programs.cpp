@@ -66,7 +66,8 @@ STANDIN_API cl_int clBuildProgram(cl_program program, cl_uint, const cl_device_i
                                   void(CL_CALLBACK*)(cl_program, void*), void*) {
     if (const int32_t status = enter("clBuildProgram", options != nullptr ? options : "")) return status;
     if (!isLive(program, "program")) return complain("clBuildProgram"), CL_INVALID_PROGRAM;
-    if (!program->fromBinary && (script().failBuilds || program->source.find("#error") != std::string::npos)) {
+    const bool hasError = !script().ignoreErrorLines && program->source.find("#error") != std::string::npos;
+    if (!program->fromBinary && (script().failBuilds || hasError)) {
         program->log = script().buildLog;
         return CL_BUILD_PROGRAM_FAILURE;
     }

@@ -40,3 +40,8 @@ extern "C" int atexit(void (*function)()) {
     return __cxa_atexit([](void* given) { reinterpret_cast<void (*)()>(given)(); }, reinterpret_cast<void*>(function),
                         &__dso_handle);
 }
+
+// Under the address sanitizer an allocation that cannot be had fails as everywhere else.
+extern "C" __attribute__((visibility("default"))) const char* __asan_default_options() {
+    return "allocator_may_return_null=1";
+}

@@ -47,6 +47,16 @@ TEST_F(Kernels, WithoutKeepInCacheTheOldOneIsDroppedAndANewOneBuilt) {
     EXPECT_EQ(driver().callCount("clCreateProgramWithSource"), 2u);
 }
 
+TEST_F(Kernels, GeneratedTextsUnderOneKeyAreToldApart) {
+    const zor::KernelRequest request{.fileName = "Fused", .kernelName = "AddKernel", .generatedSources = true};
+    zor::Kernel* const first = get(request);
+    EXPECT_EQ(get(request), first);
+    source = "kernel void AddKernel() { other(); }";
+    get(request);
+    EXPECT_EQ(driver().lastCall("clCreateProgramWithSource").text, source);
+    EXPECT_EQ(driver().callCount("clCreateKernel"), 2u);
+}
+
 TEST_F(Kernels, ACompilerErrorPrintsItsLogAndTheDeviceStaysUsable) {
     driver().buildLog = std::string(3 << 20, 'x') + "END";
     source = "#error AddKernel";

@@ -14,12 +14,12 @@ struct Grouped : std::numpunct<char> {
 
 // Makes a German locale in the folder where the system has none; false where that cannot be had.
 bool setCommaLocale(const fs::path& folder) {
-    const std::string name = (folder / "de_DE.UTF-8").string();
-    const std::string command = "localedef -i de_DE -f UTF-8 '" + name + "' >/dev/null 2>&1";
+    const std::string name = (folder / "de_DE").string();
+    const std::string command = "localedef -i de_DE -f ISO-8859-1 '" + name + "' >/dev/null 2>&1";
     if (std::setlocale(LC_ALL, "de_DE.UTF-8") != nullptr) return true;
     if (std::system(command.c_str()) != 0) return false;
     setenv("LOCPATH", folder.c_str(), 1);
-    return std::setlocale(LC_ALL, "de_DE.UTF-8") != nullptr;
+    return std::setlocale(LC_ALL, "de_DE") != nullptr;
 }
 
 }  // namespace
