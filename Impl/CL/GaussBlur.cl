@@ -32,6 +32,9 @@ __constant float kCoefficients[TAPS] = COEFFS;
 #define BLOCK_COLUMNS 8
 #define BLOCK_ROWS 4
 
+// Blocks side by side in a strip of the vertical pass: as many as keep the rows of a strip within 128 KiB of cache.
+#define STRIP_BLOCKS (TAPS < 512 ? 1024 / (TAPS + 3) : 2)
+
 // Pixels are staged for as many taps at a time, so that private memory has a bound for any radius.
 #define STAGED_TAPS (TAPS < 512 ? TAPS : 512)
 
@@ -40,24 +43,33 @@ __constant float kCoefficients[TAPS] = COEFFS;
 typedef float16 __attribute__((aligned(16))) FourPixels;
 
 // Adds to the sums of 16 neighbouring pixels; `window` begins at the first pixel's first tap.
-static inline void AddTaps(float16* sums, const float4* window, int first_tap, int taps) {
-    float16 sum0 = sums[0];
-    float16 sum1 = sums[1];
-    float16 sum2 = sums[2];
-    float16 sum3 = sums[3];
-    for (int i = 0; i < taps; ++i) {
-        const float weight = kCoefficients[first_tap + i];
-        const FourPixels* pixels = (const FourPixels*)(window + i);
-        sum0 += pixels[0] * weight;
-        sum1 += pixels[1] * weight;
-        sum2 += pixels[2] * weight;
-        sum3 += pixels[3] * weight;
+#define DEFINE_ADD_TAPS(name, space)                                                                     \
+    static inline void name(float16* sums, space const float4* window, int first_tap, int taps) {       \
+        float16 sum0 = sums[0];                                                                          \
+        float16 sum1 = sums[1];                                                                          \
+        float16 sum2 = sums[2];                                                                          \
+        float16 sum3 = sums[3];                                                                          \
+        for (int i = 0; i < taps; ++i) {                                                                 \
+            const float weight = kCoefficients[first_tap + i];                                           \
+            space const FourPixels* pixels = (space const FourPixels*)(window + i);                      \
+            sum0 += pixels[0] * weight;                                                                  \
+            sum1 += pixels[1] * weight;                                                                  \
+            sum2 += pixels[2] * weight;                                                                  \
+            sum3 += pixels[3] * weight;                                                                  \
+        }                                                                                                \
+        sums[0] = sum0;                                                                                  \
+        sums[1] = sum1;                                                                                  \
+        sums[2] = sum2;                                                                                  \
+        sums[3] = sum3;                                                                                  \
     }
-    sums[0] = sum0;
-    sums[1] = sum1;
-    sums[2] = sum2;
-    sums[3] = sum3;
-}
+DEFINE_ADD_TAPS(AddTaps, __private)
+
+// A stored picture of four floats is its own window wherever no border is near.
+#define IS_LAYOUT_float_4 1
+#define READS_IN_PLACE PASTE_LAYOUT(IS_LAYOUT, srcBuffer_COMP_TYPE, srcBuffer_COMP_NUM)
+#if READS_IN_PLACE
+DEFINE_ADD_TAPS(AddStoredTaps, __global)
+#endif
 
 __kernel void GaussBlurHorKernel(srcBufferType(srcBuffer), dst_float_4 dstBuffer) {
     const int2 size = GET_BUFFER_SIZE(dstBuffer);
@@ -82,7 +94,17 @@ __kernel void GaussBlurHorKernel(srcBufferType(srcBuffer), dst_float_4 dstBuffer
             const int taps = min(STAGED_TAPS, TAPS - tap);
             const int first = column - cRadius + tap;
             const int staged = parts * PIXELS_AT_A_TIME + taps - 1;
-            if (first >= 0 && first + staged <= size.x) {
+            const bool is_inside = first >= 0 && first + staged <= size.x;
+#if READS_IN_PLACE
+            if (is_inside) {
+                __global const float4* pixels = srcBuffer + PixelIndex(GET_BUFFER_SIZE(srcBuffer), first, row);
+                for (int part = 0; part < parts; ++part) {
+                    AddStoredTaps(sums + 4 * part, pixels + PIXELS_AT_A_TIME * part, tap, taps);
+                }
+                continue;
+            }
+#endif
+            if (is_inside) {
                 for (int i = 0; i < staged; ++i) {
                     window[i] = ReadPixel(srcBuffer, first + i, row);
                 }
@@ -153,20 +175,23 @@ static inline float4 SumColumn(__global const float4* srcBuffer, int2 size, int 
     return sum;
 }
 
-// Blocks follow each other down strips of 8 columns, so that a block finds the rows of the one before in the cache. The
-// last strip is as narrow as the width leaves it.
+// Full blocks first: strip after strip, across each strip and down, so that a block finds in the cache the rows that
+// the blocks above it have read. Then, pixel by pixel, the columns and rows that fill no block.
 __kernel void GaussBlurVertKernel(src_float_4 srcBuffer, dstBufferType(dstBuffer)) {
     const int2 size = GET_BUFFER_SIZE(dstBuffer);
     const uint count = (uint)size.x * (uint)size.y;
-    const uint first = (uint)get_global_id(0);
-    if (first % BLOCK_SIZE != 0 || first >= count) {
+    const uint block = (uint)get_global_id(0) / BLOCK_SIZE;
+    if ((uint)get_global_id(0) % BLOCK_SIZE != 0 || block * BLOCK_SIZE >= count) {
         return;
     }
-    const uint behind = min(first + BLOCK_SIZE, count);
-    const uint strip = first / (uint)(BLOCK_COLUMNS * size.y);
-    const int first_row = (int)(first / BLOCK_COLUMNS - strip * (uint)size.y);
-    const int first_column = (int)strip * BLOCK_COLUMNS;
-    if (first_column + BLOCK_COLUMNS <= size.x && first_row + BLOCK_ROWS <= size.y) {
+    const uint across = (uint)size.x / BLOCK_COLUMNS;
+    const uint down = (uint)size.y / BLOCK_ROWS;
+    if (block < across * down) {
+        const uint strip = block / (STRIP_BLOCKS * down);
+        const uint width = min((uint)STRIP_BLOCKS, across - strip * STRIP_BLOCKS);
+        const uint inside = block - strip * STRIP_BLOCKS * down;
+        const int first_column = (int)(strip * STRIP_BLOCKS + inside % width) * BLOCK_COLUMNS;
+        const int first_row = (int)(inside / width) * BLOCK_ROWS;
         for (int column = first_column; column < first_column + BLOCK_COLUMNS; column += 4) {
             float16 sums[BLOCK_ROWS];
             SumRows(sums, srcBuffer, size, column, first_row);
@@ -177,15 +202,20 @@ __kernel void GaussBlurVertKernel(src_float_4 srcBuffer, dstBufferType(dstBuffer
         }
         return;
     }
-    // Blocks at the end of a strip and in the narrow one.
-    for (uint place = first; place < behind; ++place) {
-        const uint own_strip = place / (uint)(BLOCK_COLUMNS * size.y);
-        const int left = (int)own_strip * BLOCK_COLUMNS;
-        const uint width = (uint)min(BLOCK_COLUMNS, size.x - left);
-        const uint inside = place - own_strip * (uint)(BLOCK_COLUMNS * size.y);
-        const int column = left + (int)(inside % width);
-        const int row = (int)(inside / width);
-        WritePixel(dstBuffer, column, row, SumColumn(srcBuffer, size, column, row));
+    const uint covered_columns = across * BLOCK_COLUMNS;
+    const uint margin = (uint)size.x - covered_columns;
+    const uint margin_pixels = margin * (uint)size.y;
+    const uint rest = count - across * down * BLOCK_SIZE;
+    const uint first = (block - across * down) * BLOCK_SIZE;
+    for (uint place = first; place < min(first + BLOCK_SIZE, rest); ++place) {
+        int2 coord;
+        if (place < margin_pixels) {
+            coord = (int2)((int)(covered_columns + place % margin), (int)(place / margin));
+        } else {
+            const uint below = place - margin_pixels;
+            coord = (int2)((int)(below % covered_columns), (int)(down * BLOCK_ROWS + below / covered_columns));
+        }
+        WritePixel(dstBuffer, coord.x, coord.y, SumColumn(srcBuffer, size, coord.x, coord.y));
     }
 }
 
