@@ -77,8 +77,6 @@ class TovImage final : public TovObject {
         uint64_t size = 0;    // bytes
     };
 
-    void requireUsableBuffer(cl_mem memory) const;
-    void requireUsableImage(cl_mem memory) const;
     void placeBuffer(cl_mem memory, uint64_t size);
     void upload(const void* data);
 

@@ -1,80 +1,84 @@
 // Images over memory that the caller owns: OpenCL buffers, OpenCL images and OpenGL textures.
-#include <array>
+#include <optional>
 
 #include "core/exception.h"
 #include "core/image.h"
 
 namespace {
 
+// What a driver does not tell about a memory object cannot be checked.
 template <class Value>
-Value memoryInfo(cl_mem memory, cl_mem_info key) {
+std::optional<Value> memoryInfo(cl_mem memory, cl_mem_info key) {
     Value value{};
-    if (zor::cl().clGetMemObjectInfo(memory, key, sizeof value, &value, nullptr) != CL_SUCCESS)
-        refuse(TOV_ERROR_INTERNAL_ERROR, "The OpenCL memory object cannot be queried");
+    if (zor::cl().clGetMemObjectInfo(memory, key, sizeof value, &value, nullptr) != CL_SUCCESS) return std::nullopt;
     return value;
 }
 
 template <class Value>
-Value imageInfo(cl_mem memory, cl_image_info key) {
+std::optional<Value> imageInfo(cl_mem memory, cl_image_info key) {
     Value value{};
-    if (zor::cl().clGetImageInfo(memory, key, sizeof value, &value, nullptr) != CL_SUCCESS)
-        refuse(TOV_ERROR_INTERNAL_ERROR, "The OpenCL image cannot be queried");
+    if (!zor::cl().clGetImageInfo) return std::nullopt;
+    if (zor::cl().clGetImageInfo(memory, key, sizeof value, &value, nullptr) != CL_SUCCESS) return std::nullopt;
     return value;
 }
 
 // Integer channels cannot be read as floats.
 bool isIntegerChannel(cl_channel_type type) noexcept {
-    static constexpr std::array kIntegerTypes = {CL_SIGNED_INT8,   CL_SIGNED_INT16,   CL_SIGNED_INT32,
-                                                 CL_UNSIGNED_INT8, CL_UNSIGNED_INT16, CL_UNSIGNED_INT32};
-    for (const auto integer : kIntegerTypes)
-        if (type == static_cast<cl_channel_type>(integer)) return true;
-    return false;
+    return type >= CL_SIGNED_INT8 && type <= CL_UNSIGNED_INT32;
 }
 
 [[noreturn]] void refuseMemory(const char* why) {
     refuse(TOV_ERROR_INVALID_PARAMETER, why);
 }
 
+uint64_t requireSize(cl_mem memory) {
+    const auto size = memoryInfo<size_t>(memory, CL_MEM_SIZE);
+    if (!size) refuse(TOV_ERROR_INTERNAL_ERROR, "The OpenCL memory object cannot be queried");
+    return *size;
+}
+
+void requireType(cl_mem memory, cl_mem_object_type wanted, const char* why) {
+    if (memoryInfo<cl_mem_object_type>(memory, CL_MEM_TYPE).value_or(wanted) != wanted) refuseMemory(why);
+}
+
 // An image may be bound as input and as output, so kernels need both kinds of access.
 void requireAccess(cl_mem memory) {
-    if ((memoryInfo<cl_mem_flags>(memory, CL_MEM_FLAGS) & (CL_MEM_READ_ONLY | CL_MEM_WRITE_ONLY)) != 0)
+    const cl_mem_flags flags = memoryInfo<cl_mem_flags>(memory, CL_MEM_FLAGS).value_or(0);
+    if ((flags & (CL_MEM_READ_ONLY | CL_MEM_WRITE_ONLY)) != 0)
         refuseMemory("The memory object was created read-only or write-only: kernels need to read and write it");
+}
+
+void requireImage(cl_mem memory, size_t width, size_t height) {
+    requireType(memory, CL_MEM_OBJECT_IMAGE2D, "The memory object is not a two-dimensional OpenCL image");
+    if (imageInfo<size_t>(memory, CL_IMAGE_WIDTH).value_or(width) != width ||
+        imageInfo<size_t>(memory, CL_IMAGE_HEIGHT).value_or(height) != height)
+        refuseMemory("The OpenCL image has another width or height than the descriptor");
+    const auto format = imageInfo<cl_image_format>(memory, CL_IMAGE_FORMAT);
+    if (format && isIntegerChannel(format->image_channel_data_type))
+        refuseMemory("The OpenCL image has integer channels, which kernels cannot read as floats");
 }
 
 }  // namespace
 
-void TovImage::requireUsableBuffer(cl_mem memory) const {
-    if (memoryInfo<cl_mem_object_type>(memory, CL_MEM_TYPE) != CL_MEM_OBJECT_BUFFER)
-        refuseMemory("The memory object is an OpenCL image, not a buffer: set the image flag");
-}
-
-void TovImage::requireUsableImage(cl_mem memory) const {
-    if (memoryInfo<cl_mem_object_type>(memory, CL_MEM_TYPE) != CL_MEM_OBJECT_IMAGE2D)
-        refuseMemory("The memory object is not a two-dimensional OpenCL image");
-    if (imageInfo<size_t>(memory, CL_IMAGE_WIDTH) != width() || imageInfo<size_t>(memory, CL_IMAGE_HEIGHT) != height())
-        refuseMemory("The OpenCL image has another width or height than the descriptor");
-    if (isIntegerChannel(imageInfo<cl_image_format>(memory, CL_IMAGE_FORMAT).image_channel_data_type))
-        refuseMemory("The OpenCL image has integer channels, which kernels cannot read as floats");
-}
-
 void TovImage::placeBuffer(cl_mem memory, uint64_t size) {
     placement_ = {memory, 0, size};
-    if (const auto parent = memoryInfo<cl_mem>(memory, CL_MEM_ASSOCIATED_MEMOBJECT); parent != nullptr)
-        placement_ = {parent, memoryInfo<size_t>(memory, CL_MEM_OFFSET), size};
+    const cl_mem parent = memoryInfo<cl_mem>(memory, CL_MEM_ASSOCIATED_MEMOBJECT).value_or(nullptr);
+    if (parent != nullptr) placement_ = {parent, memoryInfo<size_t>(memory, CL_MEM_OFFSET).value_or(0), size};
 }
 
 void TovImage::wrapOpenClMemory(cl_mem memory, bool isImage) {
     storage_.reset();
     external_ = true;
-    const uint64_t size = memoryInfo<size_t>(memory, CL_MEM_SIZE);
-    if (memoryInfo<cl_context>(memory, CL_MEM_CONTEXT) != device_->getContext())
+    const uint64_t size = requireSize(memory);
+    const cl_context context = device_->getContext();
+    if (memoryInfo<cl_context>(memory, CL_MEM_CONTEXT).value_or(context) != context)
         refuseMemory("The memory object belongs to another OpenCL context");
-    requireAccess(memory);
     if (isImage) {
-        requireUsableImage(memory);
+        requireImage(memory, width(), height());
     } else {
-        requireUsableBuffer(memory);
+        requireType(memory, CL_MEM_OBJECT_BUFFER, "The memory object is an OpenCL image: set the image flag");
     }
+    requireAccess(memory);
     if (size < byteSize_) refuseMemory("The memory object is smaller than the descriptor says");
     placeBuffer(memory, size);
     storage_ = std::make_unique<zor::Buffer<char>>(*device_, size, zor::BUFFER_NO_ALLOCATION);
@@ -88,7 +92,7 @@ void TovImage::wrapOpenGlTexture(uint32_t target, int32_t level, uint32_t textur
     zor::MemoryHandle memory(
         zor::cl().clCreateFromGLTexture(device_->getContext(), CL_MEM_READ_WRITE, target, level, texture, &status));
     zor::check(status, "clCreateFromGLTexture");
-    const uint64_t size = memoryInfo<size_t>(memory.get(), CL_MEM_SIZE);
+    const uint64_t size = requireSize(memory.get());
     storage_ = std::make_unique<zor::Buffer<char>>(*device_, size, zor::BUFFER_NO_ALLOCATION);
     placement_ = {memory.get(), 0, size};
     storage_->adopt(memory.release(), size, true);

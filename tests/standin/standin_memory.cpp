@@ -68,6 +68,7 @@ STANDIN_API cl_mem clCreateBuffer(cl_context context, cl_mem_flags flags, size_t
     if (readsHost(flags) != (host != nullptr)) return refuse(CL_INVALID_HOST_PTR, status);
     auto memory = makeMemory(flags, size, host);
     if (memory->bytes == nullptr) return refuse(CL_MEM_OBJECT_ALLOCATION_FAILURE, status);
+    memory->context = context;
     return give(add(std::move(memory), "memory"), status);
 }
 
@@ -76,6 +77,7 @@ STANDIN_API cl_mem clCreateImage(cl_context context, cl_mem_flags flags, const c
     if (const int32_t failure = enter("clCreateImage", {}, {flags})) return refuse(failure, status);
     if (!isLive(context, "context")) return complain("clCreateImage"), refuse(CL_INVALID_CONTEXT, status);
     auto memory = makeImage(flags, *format, description->image_width, description->image_height);
+    memory->context = context;
     return give(add(std::move(memory), "memory"), status);
 }
 
@@ -87,6 +89,7 @@ STANDIN_API cl_mem clCreateFromGLTexture(cl_context context, cl_mem_flags flags,
     if (!isLive(context, "context")) return complain("clCreateFromGLTexture"), refuse(CL_INVALID_CONTEXT, status);
     auto memory = makeImage(flags, {CL_RGBA, CL_UNORM_INT8}, 8, 8);
     memory->texture = texture;
+    memory->context = context;
     return give(add(std::move(memory), "memory"), status);
 }
 
@@ -106,6 +109,8 @@ STANDIN_API cl_int clGetMemObjectInfo(cl_mem memory, cl_mem_info key, size_t cap
             return answerValue(memory->type, capacity, out, size);
         case CL_MEM_SIZE:
             return answerValue(memory->size, capacity, out, size);
+        case CL_MEM_CONTEXT:
+            return answerValue(memory->context, capacity, out, size);
         case CL_MEM_FLAGS:
             return answerValue(memory->flags, capacity, out, size);
         case CL_MEM_HOST_PTR:

@@ -27,6 +27,7 @@ struct FreeBytes {
     void operator()(void* bytes) const noexcept { std::free(bytes); }
 };
 struct _cl_mem : Counted {
+    cl_context context = nullptr;
     cl_mem_object_type type = CL_MEM_OBJECT_BUFFER;
     cl_mem_flags flags = 0;
     size_t size = 0;
