@@ -70,8 +70,9 @@ TEST_F(RealOpenGl, DescribesOtherFormatsAndEmptyLevelsAsRefused) {
 
 TEST_F(RealOpenGl, ReportsItsErrorsButNotThoseLeftFromBefore) {
     EXPECT_EQ(wrap(texture(GL_RGBA, 8, 4), 0x1234), TOV_ERROR_OPENGL);
+    const GLuint name = texture(GL_RGBA, 8, 4);
     glEnable(0x1234);  // leaves an error behind
-    EXPECT_EQ(wrap(texture(GL_RGBA, 8, 4)), TOV_ERROR_INTERNAL_ERROR);
+    EXPECT_EQ(wrap(name), TOV_ERROR_INTERNAL_ERROR);
     EXPECT_EQ(glGetError(), GLenum{GL_NO_ERROR});
 }
 
