@@ -63,6 +63,7 @@ TEST_F(Buffers, KeepAQuarterGibibyteOfTheDeviceFree) {
     EXPECT_FALSE(refused->hasMemory());
     EXPECT_EQ(refused->size(), 0u);
     EXPECT_EQ(lines, "CL Memory Allocation Failure: 169.00MB, Total used memory: 600.00MB\n");
+    EXPECT_FALSE(make(168 * kMiB + 1)->hasMemory());
     EXPECT_TRUE(make(168 * kMiB)->hasMemory()) << "768 MiB exactly";
     first.reset();
     EXPECT_EQ(device->getUsedMemory(), 0u);

@@ -42,11 +42,14 @@ TEST_F(Discovery, ASecondQuarrionPlatformIsWarnedOfAndCountsNothing) {
     EXPECT_THAT(lines, HasSubstr("CL: 1 device (Quarrion, Inc.)\nCL: 0 device (Quarrion, Inc.)\n"));
 }
 
-TEST_F(Discovery, InitialisationMarksAQuarrionPlatformAlsoWhenTheMaskRefusesIt) {
-    driver().platforms = {{"Quarrion, Inc.", {gpu("a")}}, {"Quarrion, Inc.", {gpu("b")}}};
-    const DeviceOwner device = makeDevice({.vendorMask = ~zor::VENDOR_QUARRION});
+TEST_F(Discovery, InitialisationMarksAQuarrionPlatformAlsoWhenItHasNoDevice) {
+    driver().platforms = {{"Quarrion, Inc.", {cpu("x")}}, {"Quarrion, Inc.", {gpu("b")}}};
+    const DeviceOwner device = makeDevice();
     EXPECT_FALSE(device->isInitialized());
     EXPECT_THAT(lines, HasSubstr("CL: 0 device (Quarrion, Inc.)\nCL: 0 device (Quarrion, Inc.)\n"));
+    driver().platforms[1].vendor = "Else";
+    EXPECT_EQ(chosenName(0, ~zor::VENDOR_QUARRION), "b");
+    EXPECT_FALSE(makeDevice({.vendorMask = zor::VENDOR_QUARRION})->isInitialized());
 }
 
 TEST_F(Discovery, NoPlatformMeansNoDeviceAndNoError) {
