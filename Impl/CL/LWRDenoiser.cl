@@ -6,9 +6,17 @@
 // Pixels whose colour holds NaN or infinity are left out of every window, and so are those of which another feature is
 // unusable than at the centre (finite depth beside the infinite depth of a sky). An unusable variance counts as 0.
 
+//
+// Sums over a window run on vectors of eight entries, (1, z0 ... z6) and, where there are more than seven directions,
+// (z7, z8). A window is walked six times: the five bandwidths share one walk, and what a fit gives at its centre and the
+// variance of that are linear and quadratic in sums of the same walk as its matrix.
+
 #define BLOCK_SIZE 8
 #define FEATURES 9
-#define FIT_SIZE (FEATURES + 1)
+#define LANES 8
+#define BLOCKS 2
+#define ROWS (FEATURES + 1)
+#define SQUARE_ROWS (2 * BLOCKS * LANES)
 #define ESTIMATE_SIZE (2 * FEATURES + 1)
 #define CANDIDATES 5
 
@@ -37,14 +45,40 @@ typedef struct {
 
 // One pixel, scaled to means; zeros in place of unusable features.
 typedef struct {
+    float8 features;  // Steps from the centre across and down, depth, normal, red and green of the transition colour.
+    float last;       // Its blue.
     float3 color;
-    float3 transition;
-    float3 normal;
-    float depth;
     float variance;  // Mean of the three channels' variances, of the mean.
     int usable;      // Bits: 1 normal, 2 depth, 4 transition.
     bool color_usable;
 } Sample;
+
+// The reduced directions: entries are (1, 0 ...) + projection * (feature differences to the centre pixel).
+typedef struct {
+    int rank;
+    int blocks;  // Of entries in use.
+    float8 projection[BLOCKS][FEATURES];
+} Space;
+
+// Weighted sums over a window of entry * entry and of colour * entry; row r of a block is entry r times the block.
+typedef struct {
+    float8 products[BLOCKS][ROWS];
+    float8 red[BLOCKS];
+    float8 green[BLOCKS];
+    float8 blue[BLOCKS];
+} FitSums;
+
+static inline float SumOf(float8 value) {
+    const float4 half_sum = value.lo + value.hi;
+    const float2 quarter_sum = half_sum.lo + half_sum.hi;
+    return quarter_sum.x + quarter_sum.y;
+}
+
+static inline float ProductOf(float8 value) {
+    const float4 half_product = value.lo * value.hi;
+    const float2 quarter_product = half_product.lo * half_product.hi;
+    return quarter_product.x * quarter_product.y;
+}
 
 static inline float Mean3(float3 value) {
     return (value.x + value.y + value.z) * (1.0f / 3.0f);
@@ -54,20 +88,27 @@ static inline float3 UsableOrZero(float4 value) {
     return IsUsable(value) ? value.xyz : (float3)(0.0f);
 }
 
-static inline Sample ReadSample(IMAGE_PARAMETERS, const Window* window, int x, int y) {
-    const float4 color = ReadPixel(srcBuffer, x, y);
-    const float4 transition = ReadPixel(transBuff, x, y);
-    const float4 normal = ReadPixel(normalsBuff, x, y);
-    const float4 depth = (float4)(ReadPixel(depthBuff, x, y).y);
+// Features, and whether the colour is usable.
+static inline Sample ReadFeatures(IMAGE_PARAMETERS, const Window* window, int x, int y) {
+    const float4 transition = IS_ABSENT(transBuff) ? (float4)(0.0f) : ReadPixel(transBuff, x, y);
+    const float4 normal = IS_ABSENT(normalsBuff) ? (float4)(0.0f) : ReadPixel(normalsBuff, x, y);
+    const float4 depth = IS_ABSENT(depthBuff) ? (float4)(0.0f) : (float4)(ReadPixel(depthBuff, x, y).y);
+    const float3 t = UsableOrZero(transition) * window->per_sample;
+    const float3 n = UsableOrZero(normal) * window->per_sample;
+    const float d = UsableOrZero(depth).x * window->per_sample;
     Sample sample;
-    sample.color = UsableOrZero(color) * window->per_sample;
-    sample.transition = UsableOrZero(transition) * window->per_sample;
-    sample.normal = UsableOrZero(normal) * window->per_sample;
-    sample.depth = UsableOrZero(depth).x * window->per_sample;
-    sample.variance = fmax(Mean3(UsableOrZero(ReadPixel(vColorBuff, x, y))), 0.0f) * window->per_sample *
-                      window->per_variance;
+    sample.features = (float8)((float)(x - window->centre.x), (float)(y - window->centre.y), d, n, t.x, t.y);
+    sample.last = t.z;
     sample.usable = (IsUsable(normal) ? 1 : 0) + (IsUsable(depth) ? 2 : 0) + (IsUsable(transition) ? 4 : 0);
-    sample.color_usable = IsUsable(color);
+    sample.color_usable = IsUsable(ReadPixel(srcBuffer, x, y));
+    return sample;
+}
+
+static inline Sample ReadSample(IMAGE_PARAMETERS, const Window* window, int x, int y) {
+    Sample sample = ReadFeatures(IMAGES, window, x, y);
+    const float4 variance = IS_ABSENT(vColorBuff) ? (float4)(0.0f) : ReadPixel(vColorBuff, x, y);
+    sample.color = UsableOrZero(ReadPixel(srcBuffer, x, y)) * window->per_sample;
+    sample.variance = fmax(Mean3(UsableOrZero(variance)), 0.0f) * window->per_sample * window->per_variance;
     return sample;
 }
 
@@ -75,54 +116,79 @@ static inline bool TakesPart(const Window* window, const Sample* sample) {
     return sample->color_usable && sample->usable == window->usable;
 }
 
+// Whether a pixel's mean is too far from the centre's for the noise of the two.
+static inline bool IsOutlier(const Sample* centre, const Sample* sample) {
+    const float limit = 3.0f * (sqrt(centre->variance) + sqrt(sample->variance)) + 0.005f;
+    return centre->color_usable && fabs(Mean3(sample->color) - Mean3(centre->color)) > limit;
+}
+
 // ---- Linear algebra ------------------------------------------------------------------------------------------------
 
-// Factors the symmetric matrix A (upper triangle, row length `stride`) into L L^T; L takes the lower triangle.
+// Factors the symmetric matrix A (upper triangle, row length `stride`) into L L^T; L takes the lower triangle, with the
+// inverses of its diagonal.
 static inline void Cholesky(float* a, int stride, int n) {
     for (int i = 0; i < n; ++i) {
         for (int j = 0; j <= i; ++j) {
-            float s = 0.0f;
+            float s = a[j * stride + i];
             for (int k = 0; k < j; ++k) {
-                s += a[i * stride + k] * a[j * stride + k];
+                s -= a[i * stride + k] * a[j * stride + k];
             }
-            if (i == j) {
-                // The ridge keeps this positive but for rounding over large windows.
-                a[i * stride + i] = sqrt(fmax(a[i * stride + i] - s, 1e-6f));
-            } else {
-                a[i * stride + j] = (a[j * stride + i] - s) / a[j * stride + j];
-            }
+            // The ridge keeps the root positive but for rounding over large windows.
+            a[i * stride + j] = i == j ? rsqrt(fmax(s, 1e-6f)) : s * a[j * stride + j];
         }
     }
 }
 
+// Solves L L^T x = b, in place.
+static inline void Substitute(const float* a, int stride, int n, float3* b) {
+    for (int i = 0; i < n; ++i) {
+        for (int k = 0; k < i; ++k) {
+            b[i] -= a[i * stride + k] * b[k];
+        }
+        b[i] *= a[i * stride + i];
+    }
+    for (int i = n - 1; i >= 0; --i) {
+        for (int k = i + 1; k < n; ++k) {
+            b[i] -= a[k * stride + i] * b[k];
+        }
+        b[i] *= a[i * stride + i];
+    }
+}
+
+// A column of nine.
+typedef struct {
+    float8 head;
+    float tail;
+} Column;
+
+static inline float DotColumns(Column a, Column b) {
+    return SumOf(a.head * b.head) + a.tail * b.tail;
+}
+
+static inline void RotateColumns(Column* a, Column* b, float c, float s) {
+    const Column x = *a;
+    const Column y = *b;
+    a->head = x.head * c + y.head * s;
+    a->tail = x.tail * c + y.tail * s;
+    b->head = y.head * c - x.head * s;
+    b->tail = y.tail * c - x.tail * s;
+}
+
 // Singular values of the symmetric 9 x 9 matrix u by one-sided Jacobi rotations of its columns, after J. C. Nash,
 // "Compact Numerical Methods for Computers". Gives the right vectors v, the squared values s2 and the rank.
-static inline int Decompose(float* u, float* v, float* s2) {
+static inline int Decompose(Column* u, Column* v, float* s2) {
     const float eps = 1e-7f;
     const float e2 = 10.0f * FEATURES * eps * eps;
     const float tol = 0.1f * eps;
     int rank = FEATURES;
     int rotations = rank * (rank - 1) / 2;
-    for (int i = 0; i < FEATURES; ++i) {
-        s2[i] = 0.0f;
-        for (int j = 0; j < FEATURES; ++j) {
-            v[i * FEATURES + j] = i == j ? 1.0f : 0.0f;
-        }
-    }
     for (int sweep = 0; rotations != 0 && sweep <= 6; ++sweep) {
         rotations = rank * (rank - 1) / 2;
         for (int j = 0; j < rank - 1; ++j) {
             for (int k = j + 1; k < rank; ++k) {
-                float p = 0.0f;
-                float q = 0.0f;
-                float r = 0.0f;
-                for (int i = 0; i < FEATURES; ++i) {
-                    const float x = u[i * FEATURES + j];
-                    const float y = u[i * FEATURES + k];
-                    p += x * y;
-                    q += x * x;
-                    r += y * y;
-                }
+                float p = DotColumns(u[j], u[k]);
+                float q = DotColumns(u[j], u[j]);
+                float r = DotColumns(u[k], u[k]);
                 s2[j] = q;
                 s2[k] = r;
                 float c = 1.0f;
@@ -145,16 +211,8 @@ static inline int Decompose(float* u, float* v, float* s2) {
                     s = p < 0.0f ? -s : s;
                     c = p / (vt * s);
                 }
-                for (int i = 0; i < FEATURES; ++i) {
-                    const float x = u[i * FEATURES + j];
-                    const float y = u[i * FEATURES + k];
-                    u[i * FEATURES + j] = x * c + y * s;
-                    u[i * FEATURES + k] = y * c - x * s;
-                    const float z = v[i * FEATURES + j];
-                    const float w = v[i * FEATURES + k];
-                    v[i * FEATURES + j] = z * c + w * s;
-                    v[i * FEATURES + k] = w * c - z * s;
-                }
+                RotateColumns(&u[j], &u[k], c, s);
+                RotateColumns(&v[j], &v[k], c, s);
             }
         }
         while (rank >= 3 && s2[rank - 1] <= s2[0] * tol + tol * tol) {
@@ -164,321 +222,446 @@ static inline int Decompose(float* u, float* v, float* s2) {
     return rank;
 }
 
-// ---- Reduced coordinates and weights -------------------------------------------------------------------------------
+// ---- Reduction of the features -------------------------------------------------------------------------------------
 
-// z = projection * (feature differences to the centre pixel), `rank` coordinates.
-static inline void ReducedCoordinates(const float* projection, int rank, const Window* window, const Sample* centre,
-                                      const Sample* sample, int x, int y, float* z) {
-    const float3 normal = sample->normal - centre->normal;
-    const float3 transition = sample->transition - centre->transition;
-    const float f[FEATURES] = {(float)(x - window->centre.x), (float)(y - window->centre.y),
-                               sample->depth - centre->depth, normal.x,     normal.y,     normal.z,
-                               transition.x,                  transition.y, transition.z};
-    for (int c = 0; c < rank; ++c) {
-        float sum = 0.0f;
-        for (int r = 0; r < FEATURES; ++r) {
-            sum += projection[r * FEATURES + c] * f[r];
-        }
-        z[c] = sum;
-    }
-}
-
-// Epanechnikov kernel over the reduced coordinates with the bandwidths scale * bandwidths[i], lowered for noisy pixels.
-static inline float KernelWeight(const float* z, const float* bandwidths, float scale, int rank, float variance) {
-    float weight = 1.0f;
-    for (int i = 0; i < rank; ++i) {
-        const float t = z[i] / (scale * bandwidths[i]);
-        weight *= fabs(t) < 1.0f ? 0.75f * (1.0f - t * t) : 0.0f;
-    }
-    return weight / fmax(1.0f, variance);
-}
-
-// Whether a pixel's mean is too far from the centre's for the noise of the two.
-static inline bool IsOutlier(const Sample* centre, const Sample* sample) {
-    const float limit = 3.0f * (sqrt(centre->variance) + sqrt(sample->variance)) + 0.005f;
-    return centre->color_usable && fabs(Mean3(sample->color) - Mean3(centre->color)) > limit;
-}
-
-// ---- Steps ---------------------------------------------------------------------------------------------------------
-
-// The directions in which the features of the window vary, as columns of `projection`. Returns their number, or 0 for a
-// window without a usable pixel; mean_color is that of the window.
-static inline int ReduceFeatures(IMAGE_PARAMETERS, const Window* window, float* projection, float3* mean_color) {
+// Means of the features over the window; 0 across and down. Returns the number of pixels that take part.
+static inline float MeanFeatures(IMAGE_PARAMETERS, const Window* window, float8* mean, float* mean_last) {
     float num = 0.0f;
-    float3 mean_transition = (float3)(0.0f);
-    float3 mean_normal = (float3)(0.0f);
-    float mean_depth = 0.0f;
-    *mean_color = (float3)(0.0f);
+    float8 sum = (float8)(0.0f);
+    float sum_last = 0.0f;
     for (int y = window->low.y; y <= window->high.y; ++y) {
         for (int x = window->low.x; x <= window->high.x; ++x) {
-            const Sample sample = ReadSample(IMAGES, window, x, y);
-            if (TakesPart(window, &sample)) {
-                num += 1.0f;
-                mean_transition += sample.transition;
-                mean_normal += sample.normal;
-                mean_depth += sample.depth;
-                *mean_color += sample.color;
-            }
+            const Sample sample = ReadFeatures(IMAGES, window, x, y);
+            const float part = TakesPart(window, &sample) ? 1.0f : 0.0f;
+            num += part;
+            sum += sample.features * part;
+            sum_last += sample.last * part;
         }
     }
-    if (num == 0.0f) {
-        return 0;
-    }
-    mean_transition /= num;
-    mean_normal /= num;
-    mean_depth /= num;
-    *mean_color /= num;
+    const float inverse = 1.0f / fmax(num, 1.0f);
+    *mean = sum * inverse;
+    (*mean).lo.lo = (float2)(0.0f);
+    *mean_last = sum_last * inverse;
+    return num;
+}
 
+// Scales that make the features' deviations from the means 1 at most; those of the position count half windows.
+static inline float8 FeatureScales(IMAGE_PARAMETERS, const Window* window, float8 mean, float mean_last) {
     float depth_range = 0.0f;
     float normal_range = 0.0f;
     float transition_range = 0.0f;
     for (int y = window->low.y; y <= window->high.y; ++y) {
         for (int x = window->low.x; x <= window->high.x; ++x) {
-            const Sample sample = ReadSample(IMAGES, window, x, y);
-            if (TakesPart(window, &sample)) {
-                const float3 normal = sample.normal - mean_normal;
-                const float3 transition = sample.transition - mean_transition;
-                depth_range = fmax(depth_range, fabs(sample.depth - mean_depth));
-                normal_range = fmax(normal_range, dot(normal, normal));
-                transition_range = fmax(transition_range, dot(transition, transition));
-            }
+            const Sample sample = ReadFeatures(IMAGES, window, x, y);
+            const float part = TakesPart(window, &sample) ? 1.0f : 0.0f;
+            const float8 delta = (sample.features - mean) * part;
+            const float8 square = delta * delta;
+            const float last = (sample.last - mean_last) * part;
+            depth_range = fmax(depth_range, fabs(delta.s2));
+            normal_range = fmax(normal_range, square.s3 + square.s4 + square.s5);
+            transition_range = fmax(transition_range, square.s6 + square.s7 + last * last);
         }
     }
-    const float depth_scale = 1.0f / fmax(depth_range, 0.01f);
-    const float normal_scale = 1.0f / fmax(sqrt(normal_range), 0.01f);
-    const float transition_scale = 1.0f / fmax(sqrt(transition_range), 0.01f);
+    const float position = 1.0f / window->half_window;
+    const float depth = 1.0f / fmax(depth_range, 0.01f);
+    const float normal = 1.0f / fmax(sqrt(normal_range), 0.01f);
+    const float transition = 1.0f / fmax(sqrt(transition_range), 0.01f);
+    return (float8)(position, position, depth, normal, normal, normal, transition, transition);
+}
 
-    float matrix[FEATURES * FEATURES];
-    for (int i = 0; i < FEATURES * FEATURES; ++i) {
-        matrix[i] = 0.0f;
+// Noise of a pixel's scaled features.
+static inline float FeatureNoise(IMAGE_PARAMETERS, const Window* window, float8 scales, int x, int y) {
+    const float scale = window->per_variance;
+    float noise = 0.0f;
+    if (!IS_ABSENT(vDepthBuff)) {
+        const float4 depth = (float4)(ReadPixel(vDepthBuff, x, y).y);
+        noise += scales.s2 * scales.s2 * clamp(UsableOrZero(depth).x * scale, 0.0f, 1.0f);
+    }
+    if (!IS_ABSENT(vNormalsBuff)) {
+        const float3 normal = clamp(UsableOrZero(ReadPixel(vNormalsBuff, x, y)) * scale, 0.0f, 1.0f);
+        noise += scales.s3 * scales.s3 * (normal.x + normal.y + normal.z);
+    }
+    if (!IS_ABSENT(vTransBuff)) {
+        const float3 transition = clamp(UsableOrZero(ReadPixel(vTransBuff, x, y)) * scale, 0.0f, 1.0f);
+        noise += scales.s7 * scales.s7 * (transition.x + transition.y + transition.z);
+    }
+    return noise * window->per_sample;
+}
+
+// The directions in which the features of the window vary; none for a window without a usable pixel.
+static inline void ReduceFeatures(IMAGE_PARAMETERS, const Window* window, Space* space) {
+    float8 mean;
+    float mean_last;
+    space->rank = 0;
+    space->blocks = 0;
+    if (MeanFeatures(IMAGES, window, &mean, &mean_last) == 0.0f) {
+        return;
+    }
+    const float8 scales = FeatureScales(IMAGES, window, mean, mean_last);
+    Column matrix[FEATURES];
+    Column vectors[FEATURES];
+    for (int i = 0; i < FEATURES; ++i) {
+        matrix[i].head = vectors[i].head = (float8)(0.0f);
+        matrix[i].tail = vectors[i].tail = 0.0f;
     }
     float norm = 0.0f;
     for (int y = window->low.y; y <= window->high.y; ++y) {
         for (int x = window->low.x; x <= window->high.x; ++x) {
-            const Sample sample = ReadSample(IMAGES, window, x, y);
+            const Sample sample = ReadFeatures(IMAGES, window, x, y);
             if (!TakesPart(window, &sample)) {
                 continue;
             }
-            const float3 normal = (sample.normal - mean_normal) * normal_scale;
-            const float3 transition = (sample.transition - mean_transition) * transition_scale;
-            const float delta[FEATURES] = {(float)(x - window->centre.x) / window->half_window,
-                                           (float)(y - window->centre.y) / window->half_window,
-                                           (sample.depth - mean_depth) * depth_scale,
-                                           normal.x,
-                                           normal.y,
-                                           normal.z,
-                                           transition.x,
-                                           transition.y,
-                                           transition.z};
-            for (int r = 0; r < FEATURES; ++r) {
-                for (int c = r; c < FEATURES; ++c) {
-                    matrix[r * FEATURES + c] += delta[r] * delta[c];
-                }
-            }
-            const float scale = window->per_variance;
-            const float3 normal_noise = clamp(UsableOrZero(ReadPixel(vNormalsBuff, x, y)) * scale, 0.0f, 1.0f);
-            const float3 transition_noise = clamp(UsableOrZero(ReadPixel(vTransBuff, x, y)) * scale, 0.0f, 1.0f);
-            const float4 depth_variance = (float4)(ReadPixel(vDepthBuff, x, y).y);
-            const float depth_noise = clamp(UsableOrZero(depth_variance).x * scale, 0.0f, 1.0f);
-            norm += (depth_scale * depth_scale * depth_noise +
-                     normal_scale * normal_scale * 3.0f * Mean3(normal_noise) +
-                     transition_scale * transition_scale * 3.0f * Mean3(transition_noise)) *
-                    window->per_sample;
+            const float8 delta = (sample.features - mean) * scales;
+            const float last = (sample.last - mean_last) * scales.s7;
+            matrix[0].head += delta * delta.s0;
+            matrix[1].head += delta * delta.s1;
+            matrix[2].head += delta * delta.s2;
+            matrix[3].head += delta * delta.s3;
+            matrix[4].head += delta * delta.s4;
+            matrix[5].head += delta * delta.s5;
+            matrix[6].head += delta * delta.s6;
+            matrix[7].head += delta * delta.s7;
+            matrix[8].head += delta * last;
+            matrix[8].tail += last * last;
+            norm += FeatureNoise(IMAGES, window, scales, x, y);
         }
     }
-    for (int r = 0; r < FEATURES; ++r) {
-        for (int c = 0; c < r; ++c) {
-            matrix[r * FEATURES + c] = matrix[c * FEATURES + r];
-        }
+    const float* last_row = (const float*)&matrix[8].head;
+    for (int i = 0; i < LANES; ++i) {
+        matrix[i].tail = last_row[i];
+        ((float*)&vectors[i].head)[i] = 1.0f;
     }
+    vectors[LANES].tail = 1.0f;
 
-    float vectors[FEATURES * FEATURES];
-    float s2[FEATURES];
+    float s2[FEATURES] = {0.0f, 0.0f, 0.0f, 0.0f, 0.0f, 0.0f, 0.0f, 0.0f, 0.0f};
     const int estimated = Decompose(matrix, vectors, s2);
     const float threshold = 0.01f + 2.0f * (sqrt(norm) / (sqrt((float)estimated) * 0.5f));
+    for (int r = 0; r < FEATURES; ++r) {
+        space->projection[0][r] = space->projection[1][r] = (float8)(0.0f);
+    }
     int rank = 0;
     for (int c = 0; c < FEATURES; ++c) {
         // The two directions of the position always count.
         if (c >= 2 && sqrt(sqrt(fabs(s2[c]))) <= threshold) {
             continue;
         }
-        for (int r = 0; r < FEATURES; ++r) {
-            const float scale = r < 2   ? 1.0f / window->half_window
-                                : r < 3 ? depth_scale
-                                : r < 6 ? normal_scale
-                                        : transition_scale;
-            projection[r * FEATURES + rank] = vectors[r * FEATURES + c] * scale;
-        }
         ++rank;
+        const float8 head = vectors[c].head * scales;
+        for (int r = 0; r < LANES; ++r) {
+            ((float*)&space->projection[rank / LANES][r])[rank % LANES] = ((const float*)&head)[r];
+        }
+        ((float*)&space->projection[rank / LANES][LANES])[rank % LANES] = vectors[c].tail * scales.s7;
     }
-    return rank;
+    space->rank = rank;
+    space->blocks = rank / LANES + 1;
 }
 
-// Bandwidth of each reduced direction, from the curvature of a fit with squares over the whole window.
-static inline void EstimateBandwidths(IMAGE_PARAMETERS, const Window* window, const Sample* centre,
-                                      const float* projection, int rank, float factor, float* bandwidths) {
-    const int size = 2 * rank + 1;
-    float a[ESTIMATE_SIZE * ESTIMATE_SIZE];
-    float3 b[ESTIMATE_SIZE];
-    float z[2 * FEATURES];
-    float unit[FEATURES];
-    for (int i = 0; i < ESTIMATE_SIZE * ESTIMATE_SIZE; ++i) {
-        a[i] = 0.0f;
+// ---- Entries and weights -------------------------------------------------------------------------------------------
+
+static inline void ComputeEntries(const Space* space, const Sample* centre, const Sample* sample, float8* entries) {
+    const float8 d = sample->features - centre->features;
+    const float last = sample->last - centre->last;
+    entries[0] = (float8)(1.0f, 0.0f, 0.0f, 0.0f, 0.0f, 0.0f, 0.0f, 0.0f);
+    entries[1] = (float8)(0.0f);
+    for (int b = 0; b < space->blocks; ++b) {
+        const float8* p = space->projection[b];
+        entries[b] += d.s0 * p[0] + d.s1 * p[1] + d.s2 * p[2] + d.s3 * p[3] + d.s4 * p[4] + d.s5 * p[5] +
+                      d.s6 * p[6] + d.s7 * p[7] + last * p[8];
     }
-    for (int i = 0; i < ESTIMATE_SIZE; ++i) {
-        b[i] = (float3)(0.0f);
+}
+
+// Epanechnikov kernel, lowered for noisy pixels: 0.75 (1 - t^2) for each direction, whose t^2 is an entry of `squares`
+// (other entries are 0) times `factor`. `full` is the weight of t = 0 and of this pixel.
+static inline float KernelWeight(const Space* space, const float8* squares, float factor, float full) {
+    float weight = full * ProductOf(max(1.0f - squares[0] * factor, 0.0f));
+    if (space->blocks > 1) {
+        weight *= ProductOf(max(1.0f - squares[1] * factor, 0.0f));
     }
-    for (int i = 0; i < FEATURES; ++i) {
-        unit[i] = 1.0f;
+    return weight;
+}
+
+static inline float FullWeight(const Space* space, const Sample* sample) {
+    float weight = 1.0f;
+    for (int i = 0; i < space->rank; ++i) {
+        weight *= 0.75f;
     }
+    return weight / fmax(1.0f, sample->variance);
+}
+
+// Bandwidth of each reduced direction, from the curvature of a fit with squares over the whole window. Gives the
+// inverses of the squared bandwidths, in the order of the entries.
+static inline void EstimateBandwidths(IMAGE_PARAMETERS, const Window* window, const Sample* centre, const Space* space,
+                                      float factor, float8* inverse_squares) {
+    const int rank = space->rank;
+    const int blocks = space->blocks;
+    const int squares_at = blocks * LANES;  // Entries, then as many squares; the square of 1 is left 0.
+    float8 products[2 * BLOCKS][SQUARE_ROWS];
+    float8 colors[3][2 * BLOCKS];
+    float8 entries[2 * BLOCKS];
+    for (int b = 0; b < 2 * blocks; ++b) {
+        for (int r = 0; r < 2 * squares_at; ++r) {
+            products[b][r] = (float8)(0.0f);
+        }
+        colors[0][b] = colors[1][b] = colors[2][b] = (float8)(0.0f);
+    }
+    const float* entry = (const float*)entries;
     for (int y = window->low.y; y <= window->high.y; ++y) {
         for (int x = window->low.x; x <= window->high.x; ++x) {
             const Sample sample = ReadSample(IMAGES, window, x, y);
             if (!TakesPart(window, &sample)) {
                 continue;
             }
-            ReducedCoordinates(projection, rank, window, centre, &sample, x, y, z);
-            const float weight = KernelWeight(z, unit, 1.0f, rank, sample.variance);
+            float8 own[BLOCKS];
+            ComputeEntries(space, centre, &sample, own);
+            for (int b = 0; b < blocks; ++b) {
+                entries[b] = own[b];
+                own[b] *= own[b];
+                own[0].s0 = 0.0f;
+                entries[blocks + b] = own[b];
+            }
+            const float weight = KernelWeight(space, own, 1.0f, FullWeight(space, &sample));
             if (weight == 0.0f) {
                 continue;
             }
-            for (int i = 0; i < rank; ++i) {
-                z[rank + i] = z[i] * z[i];
+            for (int b = 0; b < 2 * blocks; ++b) {
+                const float8 block = entries[b] * weight;
+                for (int r = 0; r <= rank; ++r) {
+                    products[b][r] += block * entry[r];
+                }
+                colors[0][b] += block * sample.color.x;
+                colors[1][b] += block * sample.color.y;
+                colors[2][b] += block * sample.color.z;
             }
-            a[0] += weight;
-            b[0] += sample.color * weight;
-            for (int c = 1; c < size; ++c) {
-                a[c] += weight * z[c - 1];
-                b[c] += sample.color * (weight * z[c - 1]);
-                for (int r = 1; r <= c; ++r) {
-                    a[r * ESTIMATE_SIZE + c] += weight * z[r - 1] * z[c - 1];
+            for (int b = blocks; b < 2 * blocks; ++b) {
+                const float8 block = entries[b] * weight;
+                for (int r = squares_at + 1; r <= squares_at + rank; ++r) {
+                    products[b][r] += block * entry[r];
                 }
             }
         }
     }
-    for (int i = 0; i < size; ++i) {
-        a[i * ESTIMATE_SIZE + i] += 0.001f;
+
+    float a[ESTIMATE_SIZE * ESTIMATE_SIZE];
+    float3 b[ESTIMATE_SIZE];
+    const int size = 2 * rank + 1;
+    for (int c = 0; c < size; ++c) {
+        const int lane = c <= rank ? c : squares_at + c - rank;
+        for (int r = 0; r <= c; ++r) {
+            const int row = r <= rank ? r : squares_at + r - rank;
+            a[r * ESTIMATE_SIZE + c] = ((const float*)&products[lane / LANES][row])[lane % LANES];
+        }
+        a[c * ESTIMATE_SIZE + c] += 0.001f;
+        b[c] = (float3)(((const float*)colors[0])[lane], ((const float*)colors[1])[lane],
+                        ((const float*)colors[2])[lane]);
     }
     Cholesky(a, ESTIMATE_SIZE, size);
-    for (int i = 0; i < size; ++i) {
-        for (int k = 0; k < i; ++k) {
-            b[i] -= a[i * ESTIMATE_SIZE + k] * b[k];
-        }
-        b[i] /= a[i * ESTIMATE_SIZE + i];
-    }
-    for (int i = size - 1; i >= 0; --i) {
-        for (int k = i + 1; k < size; ++k) {
-            b[i] -= a[k * ESTIMATE_SIZE + i] * b[k];
-        }
-        b[i] /= a[i * ESTIMATE_SIZE + i];
-    }
-    for (int i = 0; i < FEATURES; ++i) {
-        const float curvature = i < rank ? 2.0f * Mean3(fabs(b[i + rank + 1])) : 0.0f;
-        bandwidths[i] = factor / sqrt(curvature + 0.16f);
+    Substitute(a, ESTIMATE_SIZE, size, b);
+    inverse_squares[0] = inverse_squares[1] = (float8)(0.0f);
+    for (int i = 1; i <= rank; ++i) {
+        const float curvature = 2.0f * Mean3(fabs(b[rank + i]));
+        ((float*)inverse_squares)[i] = (curvature + 0.16f) / (factor * factor);
     }
 }
 
-// The value at the centre of the linear fit with the bandwidths scale * bandwidths[i], and its variance. A fit that
-// leaves the colours' range below is replaced by the mean over its positive weights.
-static inline float3 FitColor(IMAGE_PARAMETERS, const Window* window, const Sample* centre, const float* projection,
-                              int rank, const float* bandwidths, float scale, float* variance) {
-    float a[FIT_SIZE * FIT_SIZE];
-    float inverse[FIT_SIZE * FIT_SIZE];
-    float z[FEATURES];
-    for (int i = 0; i < FIT_SIZE * FIT_SIZE; ++i) {
-        a[i] = 0.0f;
+// ---- Fits ----------------------------------------------------------------------------------------------------------
+
+static inline void ClearProducts(const Space* space, float8 products[BLOCKS][ROWS]) {
+    for (int b = 0; b < space->blocks; ++b) {
+        for (int r = 0; r <= space->rank; ++r) {
+            products[b][r] = (float8)(0.0f);
+        }
     }
+}
+
+static inline void ClearSums(const Space* space, FitSums* sums) {
+    ClearProducts(space, sums->products);
+    for (int b = 0; b < space->blocks; ++b) {
+        sums->red[b] = sums->green[b] = sums->blue[b] = (float8)(0.0f);
+    }
+}
+
+static inline void AddProducts(const Space* space, const float8* entries, float weight,
+                               float8 products[BLOCKS][ROWS]) {
+    const float* entry = (const float*)entries;
+    for (int b = 0; b < space->blocks; ++b) {
+        const float8 block = entries[b] * weight;
+        for (int r = 0; r <= space->rank; ++r) {
+            products[b][r] += block * entry[r];
+        }
+    }
+}
+
+static inline void AddToFit(const Space* space, const float8* entries, float weight, float3 color, FitSums* sums) {
+    AddProducts(space, entries, weight, sums->products);
+    for (int b = 0; b < space->blocks; ++b) {
+        const float8 block = entries[b] * weight;
+        sums->red[b] += block * color.x;
+        sums->green[b] += block * color.y;
+        sums->blue[b] += block * color.z;
+    }
+}
+
+// The first row of the inverse of the fit's matrix: a pixel of a weight counts with weight * (row . entries) in the
+// fit's value at the centre.
+static inline void FitRow(const Space* space, const FitSums* sums, float8* row) {
+    float a[ROWS * ROWS];
+    float3 unit[ROWS];
+    for (int c = 0; c <= space->rank; ++c) {
+        for (int r = 0; r <= c; ++r) {
+            a[r * ROWS + c] = ((const float*)&sums->products[c / LANES][r])[c % LANES];
+        }
+        a[c * ROWS + c] += 0.0001f;
+        unit[c] = (float3)(c == 0 ? 1.0f : 0.0f);
+    }
+    Cholesky(a, ROWS, space->rank + 1);
+    Substitute(a, ROWS, space->rank + 1, unit);
+    row[0] = row[1] = (float8)(0.0f);
+    for (int i = 0; i <= space->rank; ++i) {
+        ((float*)row)[i] = unit[i].x;
+    }
+}
+
+static inline float3 FitValue(const Space* space, const FitSums* sums, const float8* row) {
+    float3 value = (float3)(0.0f);
+    for (int b = 0; b < space->blocks; ++b) {
+        value += (float3)(SumOf(row[b] * sums->red[b]), SumOf(row[b] * sums->green[b]), SumOf(row[b] * sums->blue[b]));
+    }
+    return value;
+}
+
+// row^T products row.
+static inline float FitVariance(const Space* space, float8 products[BLOCKS][ROWS], const float8* row) {
+    float8 sum = (float8)(0.0f);
+    for (int b = 0; b < space->blocks; ++b) {
+        for (int r = 0; r <= space->rank; ++r) {
+            sum += products[b][r] * row[b] * ((const float*)row)[r];
+        }
+    }
+    return SumOf(sum);
+}
+
+static inline bool IsNegative(float3 color) {
+    return color.x < 0.0f || color.y < 0.0f || color.z < 0.0f;
+}
+
+// Mean over the window's pixels that count positively, which replaces a fit that leaves the range of colours below.
+static inline float3 PositiveFit(IMAGE_PARAMETERS, const Window* window, const Sample* centre, const Space* space,
+                                 const float8* inverse_squares, float factor, const float8* row, float* variance) {
+    float3 color_sum = (float3)(0.0f);
+    float variance_sum = 0.0f;
+    float sum = 0.0f;
     for (int y = window->low.y; y <= window->high.y; ++y) {
         for (int x = window->low.x; x <= window->high.x; ++x) {
             const Sample sample = ReadSample(IMAGES, window, x, y);
             if (!TakesPart(window, &sample) || IsOutlier(centre, &sample)) {
                 continue;
             }
-            ReducedCoordinates(projection, rank, window, centre, &sample, x, y, z);
-            const float weight = KernelWeight(z, bandwidths, scale, rank, sample.variance);
-            a[0] += weight;
-            for (int c = 1; c <= rank; ++c) {
-                a[c] += weight * z[c - 1];
-                for (int r = 1; r <= c; ++r) {
-                    a[r * FIT_SIZE + c] += weight * z[c - 1] * z[r - 1];
-                }
-            }
-        }
-    }
-    for (int i = 0; i <= rank; ++i) {
-        a[i * FIT_SIZE + i] += 0.0001f;
-    }
-    Cholesky(a, FIT_SIZE, rank + 1);
-
-    // The first row of the inverse of A = L L^T, from the inverse of L.
-    for (int j = rank; j >= 0; --j) {
-        inverse[j * FIT_SIZE + j] = 1.0f / a[j * FIT_SIZE + j];
-        for (int k = j + 1; k <= rank; ++k) {
-            float sum = 0.0f;
-            for (int i = j + 1; i <= k; ++i) {
-                sum += inverse[k * FIT_SIZE + i] * a[i * FIT_SIZE + j];
-            }
-            inverse[k * FIT_SIZE + j] = -inverse[j * FIT_SIZE + j] * sum;
-        }
-    }
-    float row[FIT_SIZE];
-    for (int i = 0; i <= rank; ++i) {
-        row[i] = 0.0f;
-        for (int k = i; k <= rank; ++k) {
-            row[i] += inverse[k * FIT_SIZE] * inverse[k * FIT_SIZE + i];
-        }
-    }
-
-    float3 fit = (float3)(0.0f);
-    float3 positive_fit = (float3)(0.0f);
-    float positive_sum = 0.0f;
-    float fit_variance = 0.0f;
-    float positive_variance = 0.0f;
-    for (int y = window->low.y; y <= window->high.y; ++y) {
-        for (int x = window->low.x; x <= window->high.x; ++x) {
-            const Sample sample = ReadSample(IMAGES, window, x, y);
-            if (!TakesPart(window, &sample) || IsOutlier(centre, &sample)) {
-                continue;
-            }
-            ReducedCoordinates(projection, rank, window, centre, &sample, x, y, z);
-            const float weight = KernelWeight(z, bandwidths, scale, rank, sample.variance);
-            float l = row[0];
-            for (int i = 0; i < rank; ++i) {
-                l += z[i] * row[i + 1];
-            }
-            l *= weight;
-            fit += sample.color * l;
-            fit_variance += l * l * sample.variance;
+            float8 entries[BLOCKS];
+            ComputeEntries(space, centre, &sample, entries);
+            const float8 squares[BLOCKS] = {entries[0] * entries[0] * inverse_squares[0],
+                                            entries[1] * entries[1] * inverse_squares[1]};
+            const float l = KernelWeight(space, squares, factor, FullWeight(space, &sample)) *
+                            (SumOf(row[0] * entries[0]) + SumOf(row[1] * entries[1]));
             if (l > 0.0f) {
-                positive_fit += sample.color * l;
-                positive_variance += l * l * sample.variance;
-                positive_sum += l;
+                color_sum += sample.color * l;
+                variance_sum += l * l * sample.variance;
+                sum += l;
             }
         }
     }
-    if (fit.x < 0.0f || fit.y < 0.0f || fit.z < 0.0f) {
-        positive_sum = fmax(positive_sum, 0.001f);
-        fit = positive_fit / positive_sum;
-        fit_variance = positive_variance / (positive_sum * positive_sum);
-    }
-    *variance = fit_variance;
-    return fit;
+    sum = fmax(sum, 0.001f);
+    *variance = variance_sum / (sum * sum);
+    return color_sum / sum;
 }
 
-// The scale of the bandwidths, 0.2 to 1, at which bias^2 + variance is least, from models fitted to five candidates:
-// the bias grows with the square of the scale, the variance falls with its power -rank.
-static inline float OptimalScale(IMAGE_PARAMETERS, const Window* window, const Sample* centre, float3 reference,
-                                 const float* projection, int rank, const float* bandwidths, float samples) {
+// Values and variances at the centre of the fits with the candidate bandwidths.
+static inline void FitCandidates(IMAGE_PARAMETERS, const Window* window, const Sample* centre, const Space* space,
+                                 const float8* inverse_squares, float3* values, float* variances) {
+    FitSums sums[CANDIDATES];
+    float8 noise[CANDIDATES][BLOCKS][ROWS];
+    float factors[CANDIDATES];
+    for (int g = 0; g < CANDIDATES; ++g) {
+        ClearSums(space, &sums[g]);
+        ClearProducts(space, noise[g]);
+        const float scale = (float)(g + 1) / CANDIDATES;
+        factors[g] = 1.0f / (scale * scale);
+    }
+    for (int y = window->low.y; y <= window->high.y; ++y) {
+        for (int x = window->low.x; x <= window->high.x; ++x) {
+            const Sample sample = ReadSample(IMAGES, window, x, y);
+            if (!TakesPart(window, &sample) || IsOutlier(centre, &sample)) {
+                continue;
+            }
+            float8 entries[BLOCKS];
+            ComputeEntries(space, centre, &sample, entries);
+            const float8 squares[BLOCKS] = {entries[0] * entries[0] * inverse_squares[0],
+                                            entries[1] * entries[1] * inverse_squares[1]};
+            const float full = FullWeight(space, &sample);
+            // What is outside one bandwidth is outside all narrower ones.
+            for (int g = CANDIDATES - 1; g >= 0; --g) {
+                const float weight = KernelWeight(space, squares, factors[g], full);
+                if (weight == 0.0f) {
+                    break;
+                }
+                AddToFit(space, entries, weight, sample.color, &sums[g]);
+                AddProducts(space, entries, weight * weight * sample.variance, noise[g]);
+            }
+        }
+    }
+    for (int g = 0; g < CANDIDATES; ++g) {
+        float8 row[BLOCKS];
+        FitRow(space, &sums[g], row);
+        values[g] = FitValue(space, &sums[g], row);
+        variances[g] = FitVariance(space, noise[g], row);
+        if (IsNegative(values[g])) {
+            values[g] = PositiveFit(IMAGES, window, centre, space, inverse_squares, factors[g], row, &variances[g]);
+        }
+    }
+}
+
+// The value at the centre of the fit with the bandwidths times `scale`.
+static inline float3 FitColor(IMAGE_PARAMETERS, const Window* window, const Sample* centre, const Space* space,
+                              const float8* inverse_squares, float scale) {
+    const float factor = 1.0f / (scale * scale);
+    FitSums sums;
+    ClearSums(space, &sums);
+    for (int y = window->low.y; y <= window->high.y; ++y) {
+        for (int x = window->low.x; x <= window->high.x; ++x) {
+            const Sample sample = ReadSample(IMAGES, window, x, y);
+            if (!TakesPart(window, &sample) || IsOutlier(centre, &sample)) {
+                continue;
+            }
+            float8 entries[BLOCKS];
+            ComputeEntries(space, centre, &sample, entries);
+            const float8 squares[BLOCKS] = {entries[0] * entries[0] * inverse_squares[0],
+                                            entries[1] * entries[1] * inverse_squares[1]};
+            const float weight = KernelWeight(space, squares, factor, FullWeight(space, &sample));
+            if (weight > 0.0f) {
+                AddToFit(space, entries, weight, sample.color, &sums);
+            }
+        }
+    }
+    float8 row[BLOCKS];
+    FitRow(space, &sums, row);
+    const float3 value = FitValue(space, &sums, row);
+    float variance;
+    return IsNegative(value)
+               ? PositiveFit(IMAGES, window, centre, space, inverse_squares, factor, row, &variance)
+               : value;
+}
+
+// The scale of the bandwidths, 0.2 to 1, at which bias^2 + variance is least, from models fitted to the candidates: the
+// bias grows with the square of the scale, the variance falls with its power -rank.
+static inline float OptimalScale(const float3* values, const float* variances, float3 reference, int rank,
+                                 float samples) {
     real bias_matrix[4] = {0, 0, 0, 0};
     real variance_matrix[4] = {0, 0, 0, 0};
     real bias_side[2] = {0, 0};
     real variance_side[2] = {0, 0};
     for (int g = 0; g < CANDIDATES; ++g) {
         const float scale = (float)(g + 1) / CANDIDATES;
-        float fit_variance;
-        const float3 fit = FitColor(IMAGES, window, centre, projection, rank, bandwidths, scale, &fit_variance);
-        const real bias = (real)Mean3(fit - reference);
-        const real spread = (real)fmax(samples * fit_variance, 0.0f);
+        const real bias = (real)Mean3(values[g] - reference);
+        const real spread = (real)fmax(samples * variances[g], 0.0f);
         const real h2 = (real)(scale * scale);
         real ihr = 1;
         for (int i = 0; i < rank; ++i) {
@@ -514,6 +697,22 @@ static inline float OptimalScale(IMAGE_PARAMETERS, const Window* window, const S
     return clamp(pow(ratio, 1.0f / (float)(4 + rank)), 0.2f, 1.0f);
 }
 
+// Mean colour of the pixels that take part.
+static inline float3 MeanColor(IMAGE_PARAMETERS, const Window* window) {
+    float3 sum = (float3)(0.0f);
+    float num = 0.0f;
+    for (int y = window->low.y; y <= window->high.y; ++y) {
+        for (int x = window->low.x; x <= window->high.x; ++x) {
+            const Sample sample = ReadSample(IMAGES, window, x, y);
+            if (TakesPart(window, &sample)) {
+                sum += sample.color;
+                num += 1.0f;
+            }
+        }
+    }
+    return sum / fmax(num, 1.0f);
+}
+
 __kernel void LWRDenoiserFirstPass(srcBufferType(srcBuffer), srcBufferType(vColorBuff), srcBufferType(transBuff),
                                    srcBufferType(vTransBuff), srcBufferType(normalsBuff), srcBufferType(vNormalsBuff),
                                    srcBufferType(depthBuff), srcBufferType(vDepthBuff), int samples, int halfWindow,
@@ -534,21 +733,23 @@ __kernel void LWRDenoiserFirstPass(srcBufferType(srcBuffer), srcBufferType(vColo
     window.per_variance = 1.0f / (float)(samples - 1);
     window.usable = 0;
     Sample centre;
-    float3 mean_color = (float3)(0.0f);
-    float projection[FEATURES * FEATURES];
-    float bandwidths[FEATURES];
-    int rank = 0;
+    Space space;
+    space.rank = 0;
+    float8 inverse_squares[BLOCKS];
     float scale = -1.0f;
     if (inside) {
         centre = ReadSample(IMAGES, &window, coord.x, coord.y);
         window.usable = centre.usable;
-        rank = ReduceFeatures(IMAGES, &window, projection, &mean_color);
+        ReduceFeatures(IMAGES, &window, &space);
         scale = 1.0f;
     }
-    if (rank > 0) {
-        const float3 reference = centre.color_usable ? centre.color : mean_color;
-        EstimateBandwidths(IMAGES, &window, &centre, projection, rank, bandwidthFactor, bandwidths);
-        scale = OptimalScale(IMAGES, &window, &centre, reference, projection, rank, bandwidths, (float)samples);
+    if (space.rank > 0) {
+        const float3 reference = centre.color_usable ? centre.color : MeanColor(IMAGES, &window);
+        float3 values[CANDIDATES];
+        float variances[CANDIDATES];
+        EstimateBandwidths(IMAGES, &window, &centre, &space, bandwidthFactor, inverse_squares);
+        FitCandidates(IMAGES, &window, &centre, &space, inverse_squares, values, variances);
+        scale = OptimalScale(values, variances, reference, space.rank, (float)samples);
     }
     tile[place.x + BLOCK_SIZE * place.y] = scale;
     barrier(CLK_LOCAL_MEM_FENCE);
@@ -566,10 +767,9 @@ __kernel void LWRDenoiserFirstPass(srcBufferType(srcBuffer), srcBufferType(vColo
             }
         }
         float3 result = (float3)(0.0f);
-        if (rank > 0) {
-            float fit_variance;
-            result = FitColor(IMAGES, &window, &centre, projection, rank, bandwidths, scale_sum / weight_sum,
-                              &fit_variance) * (float)samples;
+        if (space.rank > 0) {
+            result = FitColor(IMAGES, &window, &centre, &space, inverse_squares, scale_sum / weight_sum) *
+                     (float)samples;
         }
         WritePixel(dstBuffer, coord.x, coord.y, (float4)(result, 1.0f));
     }
