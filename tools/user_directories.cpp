@@ -26,7 +26,7 @@ std::optional<fs::path> absolutePath(const char* text) {
 }
 
 std::optional<fs::path> userCacheDirectory() {
-    if (const auto cache = absolutePath(std::getenv("XDG_CACHE_HOME"))) return cache;
+    if (auto cache = absolutePath(std::getenv("XDG_CACHE_HOME"))) return cache;
     if (const auto home = absolutePath(std::getenv("HOME"))) return *home / ".cache";
     const passwd* const account = ::getpwuid(::geteuid());
     if (account == nullptr) return std::nullopt;

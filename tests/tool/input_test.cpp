@@ -68,7 +68,7 @@ TEST(Input, TheFirstColourLayerOfManyIsUsed) {
     const Stored layers = load(directory / "layers.exr");
     const Stored result = load(directory / "out.exr");
     ASSERT_EQ(result.channels, (std::vector<std::string>{"R", "G", "B", "A"}));
-    for (size_t i = 0; i < 6 * 4; ++i) {
+    for (size_t i = 0; i < size_t{6} * 4; ++i) {
         for (size_t c = 0; c < 4; ++c) {
             const auto from = std::ranges::find(layers.channels, "V." + result.channels[c]) - layers.channels.begin();
             ASSERT_EQ(result.values[i * 4 + c], layers.values[i * 7 + static_cast<size_t>(from)]) << i;
