@@ -124,7 +124,7 @@ uint8_t toByte(float value) {
 }
 
 OIIO::ImageSpec specFor(const OIIO::ImageOutput& output, const Picture& picture, const Channels& channels,
-                        OIIO::TypeDesc type) {
+                        const OIIO::TypeDesc& type) {
     OIIO::ImageSpec spec(static_cast<int>(picture.width), static_cast<int>(picture.height), channels.count(), type);
     const std::string_view format = output.format_name();
     if (format == "openexr" && picture.channels.size() == static_cast<size_t>(channels.count())) {
@@ -149,7 +149,7 @@ OIIO::ImageSpec specFor(const OIIO::ImageOutput& output, const Picture& picture,
     return spec;
 }
 
-bool writePixels(OIIO::ImageOutput& output, OIIO::TypeDesc type, const std::vector<float>& values) {
+bool writePixels(OIIO::ImageOutput& output, const OIIO::TypeDesc& type, const std::vector<float>& values) {
     if (type != OIIO::TypeDesc::UINT8) return output.write_image(OIIO::TypeDesc::FLOAT, values.data());
     std::vector<uint8_t> bytes(values.size());
     std::ranges::transform(values, bytes.begin(), toByte);

@@ -18,16 +18,16 @@ std::string quoted(std::string_view text) {
     return "\"" + std::string(text) + "\"";
 }
 
-// Reads one float at the start of the text and removes it from there.
-float takeFloat(std::string_view& text, std::string_view whole, const std::string& what) {
+// Reads one float at the start of `rest` and removes it from there; `text` is what messages quote.
+float takeFloat(std::string_view& rest, std::string_view text, const std::string& what) {
     float value = 0.0f;
-    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
+    const auto [end, error] = std::from_chars(rest.data(), rest.data() + rest.size(), value);
     if (error == std::errc::result_out_of_range) {
-        throw usageFailure(what + ": " + quoted(whole) + " does not fit a 32-bit float");
+        throw usageFailure(what + ": " + quoted(text) + " does not fit a 32-bit float");
     }
-    if (error != std::errc{}) throw usageFailure(what + ": " + quoted(whole) + " is not a number");
-    if (!std::isfinite(value)) throw usageFailure(what + ": " + quoted(whole) + " is not a finite number");
-    text.remove_prefix(static_cast<size_t>(end - text.data()));
+    if (error != std::errc{}) throw usageFailure(what + ": " + quoted(text) + " is not a number");
+    if (!std::isfinite(value)) throw usageFailure(what + ": " + quoted(text) + " is not a finite number");
+    rest.remove_prefix(static_cast<size_t>(end - rest.data()));
     return value;
 }
 
