@@ -56,7 +56,8 @@ typedef struct {
 // The reduced directions: entries are (1, 0 ...) + projection * (feature differences to the centre pixel).
 typedef struct {
     int rank;
-    int blocks;  // Of entries in use.
+    int blocks;         // Of entries in use.
+    float full_weight;  // 0.75 ^ rank
     float8 projection[BLOCKS][FEATURES];
 } Space;
 
@@ -88,26 +89,39 @@ static inline float3 UsableOrZero(float4 value) {
     return IsUsable(value) ? value.xyz : (float3)(0.0f);
 }
 
-// Features, and whether the colour is usable.
-static inline Sample ReadFeatures(IMAGE_PARAMETERS, const Window* window, int x, int y) {
-    const float4 transition = IS_ABSENT(transBuff) ? (float4)(0.0f) : ReadPixel(transBuff, x, y);
-    const float4 normal = IS_ABSENT(normalsBuff) ? (float4)(0.0f) : ReadPixel(normalsBuff, x, y);
-    const float4 depth = IS_ABSENT(depthBuff) ? (float4)(0.0f) : (float4)(ReadPixel(depthBuff, x, y).y);
-    const float3 t = UsableOrZero(transition) * window->per_sample;
-    const float3 n = UsableOrZero(normal) * window->per_sample;
-    const float d = UsableOrZero(depth).x * window->per_sample;
+static inline bool AllUsable(float4 a, float4 b, float4 c, float4 d) {
+    const uint4 ab = max(as_uint4(a) & 0x7fffffffu, as_uint4(b) & 0x7fffffffu);
+    const uint4 cd = max(as_uint4(c) & 0x7fffffffu, as_uint4(d) & 0x7fffffffu);
+    return IsUsable(as_float4(max(ab, cd)));
+}
+
+// The features beside a colour.
+static inline Sample ReadFeatures(IMAGE_PARAMETERS, const Window* window, int x, int y, float4 color) {
+    float4 transition = IS_ABSENT(transBuff) ? (float4)(0.0f) : ReadPixel(transBuff, x, y);
+    float4 normal = IS_ABSENT(normalsBuff) ? (float4)(0.0f) : ReadPixel(normalsBuff, x, y);
+    float4 depth = IS_ABSENT(depthBuff) ? (float4)(0.0f) : (float4)(ReadPixel(depthBuff, x, y).y);
     Sample sample;
-    sample.features = (float8)((float)(x - window->centre.x), (float)(y - window->centre.y), d, n, t.x, t.y);
+    sample.usable = 7;
+    sample.color_usable = true;
+    if (!AllUsable(transition, normal, depth, color)) {
+        sample.usable = (IsUsable(normal) ? 1 : 0) + (IsUsable(depth) ? 2 : 0) + (IsUsable(transition) ? 4 : 0);
+        sample.color_usable = IsUsable(color);
+        transition.xyz = UsableOrZero(transition);
+        normal.xyz = UsableOrZero(normal);
+        depth.x = UsableOrZero(depth).x;
+    }
+    const float3 t = transition.xyz * window->per_sample;
+    sample.features = (float8)((float)(x - window->centre.x), (float)(y - window->centre.y),
+                               depth.x * window->per_sample, normal.xyz * window->per_sample, t.x, t.y);
     sample.last = t.z;
-    sample.usable = (IsUsable(normal) ? 1 : 0) + (IsUsable(depth) ? 2 : 0) + (IsUsable(transition) ? 4 : 0);
-    sample.color_usable = IsUsable(ReadPixel(srcBuffer, x, y));
     return sample;
 }
 
 static inline Sample ReadSample(IMAGE_PARAMETERS, const Window* window, int x, int y) {
-    Sample sample = ReadFeatures(IMAGES, window, x, y);
+    const float4 color = ReadPixel(srcBuffer, x, y);
     const float4 variance = IS_ABSENT(vColorBuff) ? (float4)(0.0f) : ReadPixel(vColorBuff, x, y);
-    sample.color = UsableOrZero(ReadPixel(srcBuffer, x, y)) * window->per_sample;
+    Sample sample = ReadFeatures(IMAGES, window, x, y, color);
+    sample.color = UsableOrZero(color) * window->per_sample;
     sample.variance = fmax(Mean3(UsableOrZero(variance)), 0.0f) * window->per_sample * window->per_variance;
     return sample;
 }
@@ -231,7 +245,7 @@ static inline float MeanFeatures(IMAGE_PARAMETERS, const Window* window, float8*
     float sum_last = 0.0f;
     for (int y = window->low.y; y <= window->high.y; ++y) {
         for (int x = window->low.x; x <= window->high.x; ++x) {
-            const Sample sample = ReadFeatures(IMAGES, window, x, y);
+            const Sample sample = ReadFeatures(IMAGES, window, x, y, ReadPixel(srcBuffer, x, y));
             const float part = TakesPart(window, &sample) ? 1.0f : 0.0f;
             num += part;
             sum += sample.features * part;
@@ -252,7 +266,7 @@ static inline float8 FeatureScales(IMAGE_PARAMETERS, const Window* window, float
     float transition_range = 0.0f;
     for (int y = window->low.y; y <= window->high.y; ++y) {
         for (int x = window->low.x; x <= window->high.x; ++x) {
-            const Sample sample = ReadFeatures(IMAGES, window, x, y);
+            const Sample sample = ReadFeatures(IMAGES, window, x, y, ReadPixel(srcBuffer, x, y));
             const float part = TakesPart(window, &sample) ? 1.0f : 0.0f;
             const float8 delta = (sample.features - mean) * part;
             const float8 square = delta * delta;
@@ -307,7 +321,7 @@ static inline void ReduceFeatures(IMAGE_PARAMETERS, const Window* window, Space*
     float norm = 0.0f;
     for (int y = window->low.y; y <= window->high.y; ++y) {
         for (int x = window->low.x; x <= window->high.x; ++x) {
-            const Sample sample = ReadFeatures(IMAGES, window, x, y);
+            const Sample sample = ReadFeatures(IMAGES, window, x, y, ReadPixel(srcBuffer, x, y));
             if (!TakesPart(window, &sample)) {
                 continue;
             }
@@ -354,6 +368,10 @@ static inline void ReduceFeatures(IMAGE_PARAMETERS, const Window* window, Space*
     }
     space->rank = rank;
     space->blocks = rank / LANES + 1;
+    space->full_weight = 1.0f;
+    for (int i = 0; i < rank; ++i) {
+        space->full_weight *= 0.75f;
+    }
 }
 
 // ---- Entries and weights -------------------------------------------------------------------------------------------
@@ -381,11 +399,7 @@ static inline float KernelWeight(const Space* space, const float8* squares, floa
 }
 
 static inline float FullWeight(const Space* space, const Sample* sample) {
-    float weight = 1.0f;
-    for (int i = 0; i < space->rank; ++i) {
-        weight *= 0.75f;
-    }
-    return weight / fmax(1.0f, sample->variance);
+    return space->full_weight / fmax(1.0f, sample->variance);
 }
 
 // Bandwidth of each reduced direction, from the curvature of a fit with squares over the whole window. Gives the
@@ -480,25 +494,40 @@ static inline void ClearSums(const Space* space, FitSums* sums) {
     }
 }
 
-static inline void AddProducts(const Space* space, const float8* entries, float weight,
-                               float8 products[BLOCKS][ROWS]) {
-    const float* entry = (const float*)entries;
-    for (int b = 0; b < space->blocks; ++b) {
-        const float8 block = entries[b] * weight;
-        for (int r = 0; r <= space->rank; ++r) {
-            products[b][r] += block * entry[r];
-        }
-    }
-}
-
-static inline void AddToFit(const Space* space, const float8* entries, float weight, float3 color, FitSums* sums) {
-    AddProducts(space, entries, weight, sums->products);
+static inline void AddColors(const Space* space, const float8* entries, float weight, float3 color, FitSums* sums) {
     for (int b = 0; b < space->blocks; ++b) {
         const float8 block = entries[b] * weight;
         sums->red[b] += block * color.x;
         sums->green[b] += block * color.y;
         sums->blue[b] += block * color.z;
     }
+}
+
+static inline void AddToFit(const Space* space, const float8* entries, float weight, float3 color, FitSums* sums) {
+    const float* entry = (const float*)entries;
+    for (int b = 0; b < space->blocks; ++b) {
+        const float8 block = entries[b] * weight;
+        for (int r = 0; r <= space->rank; ++r) {
+            sums->products[b][r] += block * entry[r];
+        }
+    }
+    AddColors(space, entries, weight, color, sums);
+}
+
+// Also the products of squared weights and the pixel's variance.
+static inline void AddToCandidate(const Space* space, const float8* entries, float weight, const Sample* sample,
+                                  FitSums* sums, float8 noise[BLOCKS][ROWS]) {
+    const float* entry = (const float*)entries;
+    const float noise_weight = weight * sample->variance;
+    for (int b = 0; b < space->blocks; ++b) {
+        const float8 block = entries[b] * weight;
+        const float8 noise_block = block * noise_weight;
+        for (int r = 0; r <= space->rank; ++r) {
+            sums->products[b][r] += block * entry[r];
+            noise[b][r] += noise_block * entry[r];
+        }
+    }
+    AddColors(space, entries, weight, sample->color, sums);
 }
 
 // The first row of the inverse of the fit's matrix: a pixel of a weight counts with weight * (row . entries) in the
@@ -603,8 +632,7 @@ static inline void FitCandidates(IMAGE_PARAMETERS, const Window* window, const S
                 if (weight == 0.0f) {
                     break;
                 }
-                AddToFit(space, entries, weight, sample.color, &sums[g]);
-                AddProducts(space, entries, weight * weight * sample.variance, noise[g]);
+                AddToCandidate(space, entries, weight, &sample, &sums[g], noise[g]);
             }
         }
     }
