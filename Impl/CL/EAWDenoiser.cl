@@ -72,7 +72,7 @@ typedef struct {
 // A pixel's coordinate reflected about the borders; pictures too small for one reflection clamp the rest.
 static inline int4 ReflectOnce(int4 value, int size) {
     const int4 positive = value ^ (value >> 31);
-    return clamp(min(positive, 2 * size - 1 - positive), 0, size - 1);
+    return clamp(min(positive, 2 * size - 1 - positive), (int4)(0), (int4)(size - 1));
 }
 
 static inline size_t VarianceIndex(int2 size, int x, int y) {
