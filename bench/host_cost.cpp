@@ -117,15 +117,22 @@ struct CachedProgram {
     std::string options;
 };
 
-// The newest program of that name for the small picture. The option text is the first line of the file beside it.
+// Whether an option text can be that of a pass over the small picture. Passes over buffers alone name no size.
+bool fits(const std::string& options, const BarePass& pass) {
+    const std::string size = "_Res=(int2)(";
+    const std::string wanted = size + std::to_string(kSmallPicture.width) + ",";
+    return options.find(pass.option) != std::string::npos &&
+           (options.find(size) == std::string::npos || options.find(wanted) != std::string::npos);
+}
+
+// The option text is the first line of the file beside a binary.
 CachedProgram findCached(const std::string& cache, const BarePass& pass) {
-    const std::string size = "_Res=(int2)(" + std::to_string(kSmallPicture.width) + ",";
     for (const auto& entry : std::filesystem::directory_iterator(cache)) {
         if (entry.path().extension() != ".options") continue;
         if (entry.path().filename().string().rfind(pass.program, 0) != 0) continue;
         const std::string side = contentOf(entry.path());
         const std::string options = side.substr(0, side.find('\n'));
-        if (options.find(pass.option) == std::string::npos || options.find(size) == std::string::npos) continue;
+        if (!fits(options, pass)) continue;
         std::filesystem::path binary = entry.path();
         return {contentOf(binary.replace_extension()), options};
     }

@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <chrono>
+#include <ctime>
 #include <vector>
 
 namespace bench {
@@ -13,6 +14,19 @@ double secondsOf(Call&& call) {
     const auto start = std::chrono::steady_clock::now();
     call();
     return std::chrono::duration<double>(std::chrono::steady_clock::now() - start).count();
+}
+
+struct Timing {
+    double wall;       // seconds
+    double processor;  // seconds of all threads of this process together
+};
+
+// On a processor as device, the processor's time is what other programs on a busy machine disturb least.
+template <class Call>
+Timing timingOf(Call&& call) {
+    const std::clock_t before = std::clock();
+    const double wall = secondsOf(call);
+    return {wall, static_cast<double>(std::clock() - before) / CLOCKS_PER_SEC};
 }
 
 // The upper median; 0 of nothing.

@@ -8,6 +8,8 @@
 namespace bench {
 namespace {
 
+constexpr size_t kNameWidth = 42;
+
 struct Column {
     const char* title;
     const char* counter;
@@ -28,7 +30,10 @@ const std::vector<Group>& groups() {
           {"least ms", "min_ms", 2},
           {"GB/s", "GB_per_s", 2},
           {"copy GB/s", "copy_GB_per_s", 2},
-          {"of copy", "fraction_of_copy", 2}}},
+          {"of copy", "fraction_of_copy", 2},
+          {"CPU ms", "processor_ms", 2},
+          {"copy CPU", "copy_processor_ms", 2},
+          {"of copy", "processor_fraction_of_copy", 2}}},
         {"startup/",
          "First execution in a fresh process",
          {{"context ms", "context_ms", 1},
@@ -81,26 +86,22 @@ std::string cell(const Run& run, const Column& column) {
     return found == run.counters.end() ? "-" : fixed(found->second.value, column.digits);
 }
 
-void printRow(std::FILE* out, const Run& run, const Group& group, size_t nameWidth) {
-    std::string line = padded(shortName(run.benchmark_name(), group), nameWidth, false);
-    for (const Column& column : group.columns)
-        line += "  " + padded(run.error_occurred ? "-" : cell(run, column),
-                              std::max<size_t>(std::string_view(column.title).size(), 7), true);
-    if (run.error_occurred) line += "  " + run.error_message;
-    std::fprintf(out, "%s\n", line.c_str());
+size_t widthOf(const Column& column) {
+    return std::max<size_t>(std::string_view(column.title).size(), 7);
 }
 
-void printGroup(std::FILE* out, const Group& group, const std::vector<Run>& runs) {
-    size_t nameWidth = 0;
-    for (const Run& run : runs)
-        if (belongs(run, group)) nameWidth = std::max(nameWidth, shortName(run.benchmark_name(), group).size());
-    if (nameWidth == 0) return;
-    std::string head(nameWidth, ' ');
-    for (const Column& column : group.columns)
-        head += "  " + padded(column.title, std::max<size_t>(std::string_view(column.title).size(), 7), true);
+void printHead(std::FILE* out, const Group& group) {
+    std::string head(kNameWidth, ' ');
+    for (const Column& column : group.columns) head += "  " + padded(column.title, widthOf(column), true);
     std::fprintf(out, "\n%s\n%s\n", group.title, head.c_str());
-    for (const Run& run : runs)
-        if (belongs(run, group)) printRow(out, run, group, nameWidth);
+}
+
+void printRow(std::FILE* out, const Group& group, const Run& run) {
+    std::string line = padded(shortName(run.benchmark_name(), group), kNameWidth, false);
+    for (const Column& column : group.columns)
+        line += "  " + padded(run.error_occurred ? "-" : cell(run, column), widthOf(column), true);
+    if (run.error_occurred) line += "  " + run.error_message;
+    std::fprintf(out, "%s\n", line.c_str());
 }
 
 }  // namespace
@@ -112,13 +113,13 @@ bool TableReporter::ReportContext(const Context&) {
 
 void TableReporter::ReportRuns(const std::vector<Run>& runs) {
     for (const Run& run : runs) {
-        std::fprintf(stderr, "%s%s\n", run.benchmark_name().c_str(), run.error_occurred ? " failed" : "");
-        runs_.push_back(run);
+        for (const Group& group : groups()) {
+            if (!belongs(run, group)) continue;
+            if (group_ != group.prefix) printHead(out_, group);
+            group_ = group.prefix;
+            printRow(out_, group, run);
+        }
     }
-}
-
-void TableReporter::Finalize() {
-    for (const Group& group : groups()) printGroup(out_, group, runs_);
     std::fflush(out_);
 }
 

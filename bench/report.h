@@ -9,19 +9,18 @@
 
 namespace bench {
 
-// Prints a line to standard error as each benchmark ends, and the tables to `out` at the end.
+// Prints a row as each benchmark ends, so that a run that is interrupted keeps what it has measured.
 class TableReporter : public benchmark::BenchmarkReporter {
  public:
     TableReporter(std::FILE* out, std::string device) : out_(out), device_(std::move(device)) {}
 
     bool ReportContext(const Context& context) override;
     void ReportRuns(const std::vector<Run>& runs) override;
-    void Finalize() override;
 
  private:
     std::FILE* out_;
     std::string device_;
-    std::vector<Run> runs_;
+    std::string group_;  // prefix of the group that the latest row belongs to
 };
 
 }  // namespace bench

@@ -91,14 +91,19 @@ struct Samples {
     std::vector<double> filter;
     std::vector<double> copy;
     std::vector<double> fraction;  // of the copy's rate, from neighbouring runs, which share what else the machine does
+    std::vector<double> processor;
+    std::vector<double> copyProcessor;
 };
 
-void report(benchmark::State& state, const Prepared& objects, const Samples& samples) {
+void report(benchmark::State& state, const Prepared& objects, const Samples& samples, double work) {
     state.counters["median_ms"] = median(samples.filter) * 1e3;
     state.counters["min_ms"] = minimum(samples.filter) * 1e3;
     state.counters["GB_per_s"] = objects.filter->bytesMoved() / median(samples.filter) * 1e-9;
     state.counters["copy_GB_per_s"] = objects.copy->bytesMoved() / median(samples.copy) * 1e-9;
     state.counters["fraction_of_copy"] = median(samples.fraction);
+    state.counters["processor_ms"] = median(samples.processor) * 1e3;
+    state.counters["copy_processor_ms"] = median(samples.copyProcessor) * 1e3;
+    state.counters["processor_fraction_of_copy"] = work * median(samples.copyProcessor) / median(samples.processor);
 }
 
 void measure(benchmark::State& state, const std::string& name, const OpenCL& opencl, tov_context context,
@@ -108,14 +113,16 @@ void measure(benchmark::State& state, const std::string& name, const OpenCL& ope
         const double work = objects.filter->bytesMoved() / objects.copy->bytesMoved();
         Samples samples;
         for (auto _ : state) {
-            const double copy = secondsOf([&] { objects.copy->run(); });
-            const double filter = secondsOf([&] { objects.filter->execute(); });
-            state.SetIterationTime(filter);
-            samples.copy.push_back(copy);
-            samples.filter.push_back(filter);
-            samples.fraction.push_back(work * copy / filter);
+            const Timing copy = timingOf([&] { objects.copy->run(); });
+            const Timing filter = timingOf([&] { objects.filter->execute(); });
+            state.SetIterationTime(filter.wall);
+            samples.copy.push_back(copy.wall);
+            samples.filter.push_back(filter.wall);
+            samples.fraction.push_back(work * copy.wall / filter.wall);
+            samples.processor.push_back(filter.processor);
+            samples.copyProcessor.push_back(copy.processor);
         }
-        report(state, objects, samples);
+        report(state, objects, samples, work);
     } catch (const std::exception& failure) {
         state.SkipWithError(failure.what());
     }
