@@ -291,7 +291,7 @@ std::array<FilterSpec, kFilterTypes> makeCatalogue() {
                         floatParameter("colorTreshold", 0.05f, kColorThresholdText),
                         floatParameter("normalTreshold", kCosPiOver8, kNormalThresholdText),
                         floatParameter("depthTreshold", 0.1f, kDepthThresholdText)},
-         .check = checkBuffersOnly,
+         .check = checkAntialiasingImages,
          .passes = {{.program = "MLAA",
                      .kernel = "EdgeDetectionMLAA",
                      .items = {arg("srcBuffer"), arg("meshIDImg"), arg("normalsImg"), arg("depthImg"), scratch(),

@@ -112,6 +112,18 @@ void checkBuffersOnly(TovImageFilter& filter) {
     }
 }
 
+void checkAntialiasingImages(TovImageFilter& filter) {
+    checkBuffersOnly(filter);
+    const TovImage* input = filter.find("srcBuffer")->boundImage();
+    if (input == nullptr) return;  // an unbound image is refused with the images
+    if (input->desc().num_components != 4 || input->desc().type == TOV_COMPONENT_TYPE_UINT8)
+        refuse(TOV_ERROR_INTERNAL_ERROR, "The input of antialiasing must have four components of half or float");
+    // The middle pass knows the picture by this size alone.
+    const Size size = filter.find("srcBufferSize")->asSize();
+    if (size[0] != input->width() || size[1] != input->height())
+        refuse(TOV_ERROR_INVALID_PARAMETER, "srcRec of antialiasing must be the size of the input");
+}
+
 void checkWaveletImages(TovImageFilter& filter) {
     checkBuffersOnly(filter);
     const TovImage* input = filter.find("srcBuffer")->boundImage();

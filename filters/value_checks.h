@@ -15,9 +15,10 @@ void checkValues(TovImageFilter& filter);
 
 // ---- The rows' own checks ----
 
-void checkMathTestBuffers(TovImageFilter& filter);  // input and output are buffers of five floats or more
-void checkBlurSigma(TovImageFilter& filter);        // twice its square is a number that can divide
-void checkDragoLuminances(TovImageFilter& filter);  // their ratio has a logarithm that can divide
-void checkBuffersOnly(TovImageFilter& filter);      // input and output are no OpenCL images
-void checkWaveletImages(TovImageFilter& filter);    // nor of different component types or counts
-void checkRegressionGroup(TovImageFilter& filter);  // the device runs groups of 8 x 8
+void checkMathTestBuffers(TovImageFilter& filter);     // input and output are buffers of five floats or more
+void checkBlurSigma(TovImageFilter& filter);           // twice its square is a number that can divide
+void checkDragoLuminances(TovImageFilter& filter);     // their ratio has a logarithm that can divide
+void checkBuffersOnly(TovImageFilter& filter);         // input and output are no OpenCL images
+void checkAntialiasingImages(TovImageFilter& filter);  // four halves or floats, at their own size
+void checkWaveletImages(TovImageFilter& filter);       // nor of different component types or counts
+void checkRegressionGroup(TovImageFilter& filter);     // the device runs groups of 8 x 8

@@ -1,20 +1,28 @@
 // Scaling by box average, bilinear or bicubic interpolation.
 //
 // Definitions: INTERPOLATION_OPERATOR (0 box, 1 bilinear, 2 bicubic; any other leaves the kernel out), CRATIO_X and
-// CRATIO_Y, the whole source pixels per output pixel. The kernel keeps to the form in which it can be fused.
+// CRATIO_Y, the whole source pixels per output pixel.
+//
+// The kernel stands here twice. The first, one pixel per item, keeps to the form in which it can be fused, and fusion
+// takes it from the text wherever it runs. The second takes blocks of 8 x 8 pixels per item on central processors.
 
 #if INTERPOLATION_OPERATOR >= 0 && INTERPOLATION_OPERATOR <= 2
+#if !ON_CENTRAL_PROCESSOR
+
 __kernel void ResampleKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), int2 cSrcRes, int2 cDstRes,
                              float2 cRatio) {
     int2 coord;
     GET_COORD(coord, min(cDstRes, GET_BUFFER_SIZE(dstBuffer)));
     // A source that is computed instead of stored has the size 0 here, and no bounds but the given ones.
     const int2 stored = GET_BUFFER_SIZE(srcBuffer);
-    const int2 extent = stored.x > 0 ? min(cSrcRes, stored) : cSrcRes;
+    const int2 extent = max(stored.x > 0 ? min(cSrcRes, stored) : cSrcRes, 0);
 
 #if INTERPOLATION_OPERATOR == 0
-    const int2 first = (int2)(coord.x * CRATIO_X, coord.y * CRATIO_Y);
-    const int2 behind = min(first + (int2)(CRATIO_X, CRATIO_Y), extent);
+    // Sizes that a host overrides may be of any magnitude, and so their ratios.
+    const int2 first = (int2)((int)min((long)coord.x * CRATIO_X, (long)extent.x),
+                              (int)min((long)coord.y * CRATIO_Y, (long)extent.y));
+    const int2 behind = (int2)((int)min((long)first.x + CRATIO_X, (long)extent.x),
+                               (int)min((long)first.y + CRATIO_Y, (long)extent.y));
     float4 sum = (float4)(0.0f);
     for (int row = first.y; row < behind.y; ++row) {
         for (int column = first.x; column < behind.x; ++column) {
@@ -52,4 +60,126 @@ __kernel void ResampleKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer),
 #endif
     WritePixel(dstBuffer, coord.x, coord.y, result);
 }
+
+#else
+
+#define BLOCK_SIDE 8
+
+#if INTERPOLATION_OPERATOR == 0
+// Where the source pixels of an output column or row begin; sizes that a host overrides may be of any magnitude.
+static inline int BlockStart(int position, long ratio, int extent) {
+    return (int)min((long)position * ratio, (long)extent);
+}
+#else
+
+#define TAPS (2 * INTERPOLATION_OPERATOR)
+
+// Where the samples of one column or row lie in the source, and their weights.
+typedef struct {
+    int place[TAPS];
+    float weight[TAPS];
+} Samples;
+
+static inline void FindSamples(Samples* samples, int position, int size, float ratio, int extent) {
+    // The ratio of a side of one output pixel divides by zero: that pixel takes the first of the source.
+    const float exact = size > 1 ? ratio * (float)position : 0.0f;
+    const int last = max(extent - 1, 0);
+    const float whole = trunc(exact);
+    const float t = exact - whole;
+    const int q = clamp(convert_int_sat(whole), 0, last);
+#if INTERPOLATION_OPERATOR == 1
+    samples->place[0] = q;
+    samples->place[1] = min(q + 1, last);
+    samples->weight[0] = 1.0f - t;
+    samples->weight[1] = t;
+#else
+    // The factors of the four points in CubicInterp.
+    samples->place[0] = max(q - 1, 0);
+    samples->place[1] = q;
+    samples->place[2] = min(q + 1, last);
+    samples->place[3] = min(q + 2, last);
+    samples->weight[0] = ((-0.5f * t + 1.0f) * t - 0.5f) * t;
+    samples->weight[1] = (1.5f * t - 2.5f) * t * t + 1.0f;
+    samples->weight[2] = ((-1.5f * t + 2.0f) * t + 0.5f) * t;
+    samples->weight[3] = (0.5f * t - 0.5f) * t * t;
+#endif
+}
+#endif
+
+__kernel void ResampleKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), int2 cSrcRes, int2 cDstRes,
+                             float2 cRatio) {
+    const int2 limits = min(cDstRes, GET_BUFFER_SIZE(dstBuffer));
+    const int2 corner = (int2)((int)get_global_id(0), (int)get_global_id(1));
+    if (corner.x % BLOCK_SIDE != 0 || corner.y % BLOCK_SIDE != 0 || corner.x >= limits.x || corner.y >= limits.y) {
+        return;
+    }
+    const int2 extent = max(min(cSrcRes, GET_BUFFER_SIZE(srcBuffer)), 0);
+    const int columns = min(BLOCK_SIDE, limits.x - corner.x);
+    const int rows = min(BLOCK_SIDE, limits.y - corner.y);
+
+#if INTERPOLATION_OPERATOR == 0
+    for (int y = corner.y; y < corner.y + rows; ++y) {
+        const int top = BlockStart(y, CRATIO_Y, extent.y);
+        const int below = BlockStart(y + 1, CRATIO_Y, extent.y);
+        for (int x = corner.x; x < corner.x + columns; ++x) {
+            const int left = BlockStart(x, CRATIO_X, extent.x);
+            const int right = BlockStart(x + 1, CRATIO_X, extent.x);
+            const float count = (float)(right - left) * (float)(below - top);
+            float4 sum = (float4)(0.0f);
+            for (int j = top; j < below; ++j) {
+                for (int i = left; i < right; ++i) {
+                    sum += ReadPixel(srcBuffer, i, j);
+                }
+            }
+            const float4 result = count > 0.0f ? sum / count : (float4)(0.0f, 0.0f, 0.0f, 1.0f);
+            WritePixel(dstBuffer, x, y, result);
+        }
+    }
+#else
+    // All eight columns are computed: loops of known length. Those behind the picture repeat its last one.
+    Samples across[BLOCK_SIDE];
+    for (int i = 0; i < BLOCK_SIDE; ++i) {
+        FindSamples(across + i, min(corner.x + i, limits.x - 1), cDstRes.x, cRatio.x, extent.x);
+    }
+    // Source rows, interpolated at the columns of the block. Rows of one output row are neighbours: each has a place of
+    // its own until another one needs it.
+    float16 lines[TAPS][BLOCK_SIDE / 4];
+    int line_rows[TAPS];
+    for (int i = 0; i < TAPS; ++i) {
+        line_rows[i] = -1;
+    }
+    for (int y = corner.y; y < corner.y + rows; ++y) {
+        Samples down;
+        FindSamples(&down, y, cDstRes.y, cRatio.y, extent.y);
+        for (int j = 0; j < TAPS; ++j) {
+            const int row = down.place[j];
+            float4* line = (float4*)lines[row % TAPS];
+            if (line_rows[row % TAPS] == row) {
+                continue;
+            }
+            line_rows[row % TAPS] = row;
+            for (int i = 0; i < BLOCK_SIDE; ++i) {
+                float4 sum = ReadPixel(srcBuffer, across[i].place[0], row) * across[i].weight[0];
+                for (int k = 1; k < TAPS; ++k) {
+                    sum += ReadPixel(srcBuffer, across[i].place[k], row) * across[i].weight[k];
+                }
+                line[i] = sum;
+            }
+        }
+        float16 sums[BLOCK_SIDE / 4];
+        for (int i = 0; i < BLOCK_SIDE / 4; ++i) {
+            sums[i] = lines[down.place[0] % TAPS][i] * down.weight[0];
+            for (int j = 1; j < TAPS; ++j) {
+                sums[i] += lines[down.place[j] % TAPS][i] * down.weight[j];
+            }
+        }
+        const float4* pixels = (const float4*)sums;
+        for (int i = 0; i < columns; ++i) {
+            WritePixel(dstBuffer, corner.x + i, y, pixels[i]);
+        }
+    }
+#endif
+}
+
+#endif
 #endif
