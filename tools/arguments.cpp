@@ -38,11 +38,19 @@ constexpr const char* kRunFooter =
     "with 8 bits, clamped and rounded. The output is written whole or not at all.\n"
     "\n"
     "drago_tonemap measures avLum and maxLum on its input where they are not given.\n"
-    "Colour spaces have names: color_space:srcColorSpace=srgb,dstColorSpace=rec2020.\n"
+    "Colour spaces have names: color_space:srcColorSpace=srgb,dstColorSpace=rec2020. So have the ways to interpolate:\n"
+    "resample:interpOperator=box|bilinear|bicubic,size=WxH.\n"
+    "\n"
+    "Images are files, or layers of OpenEXR files: normalsImg=normal.exr, normalsImg=render.exr:Normal. Lists are\n"
+    "joined with +: inputs=a.exr+b.exr,weights=0.25+0.75; @ is the picture that the stage is given. They must be as\n"
+    "large as that picture. One channel is read into red, green and blue alike.\n"
     "\n"
     "Examples:\n"
     "  tov run render.exr -f reinhard_tonemap:cKey=0.5 -f gamma_correction:cGamma=2.2 -o picture.png\n"
     "  tov run render.exr -f drago_tonemap:cBias=0.85 -f gamma_correction:cGamma=2.2 -o picture.jpg\n"
+    "  tov run render.exr -f resample:interpOperator=bicubic --size 960x540 -o half.exr\n"
+    "  tov run render.exr -f bilateral_denoise:radius=4,inputs=@+normal.exr,sigmas=0.5+0.1 -o smooth.exr\n"
+    "  tov run layers.exr -f mlaa:normalsImg=layers.exr:Normal,depthImg=layers.exr:Depth -o smooth.png\n"
     "  tov run wide.exr -f color_space:srcColorSpace=rec2020,dstColorSpace=srgb -o narrow.exr --device cpu";
 
 // What CLI11 fills in before it is judged.
@@ -54,6 +62,7 @@ struct RawArguments {
     std::string output;
     std::string device;
     std::string cache;
+    std::string size;
     bool verbose = false;
 };
 
@@ -74,6 +83,7 @@ void addRun(CLI::App& app, RawArguments& raw) {
     run->add_option("-o,--output", raw.output, "Picture to write; its extension tells the format")
         ->required()
         ->type_name("FILE");
+    run->add_option("--size", raw.size, "Size of what the resample stage makes, say 960x540")->type_name("WxH");
     run->add_option("--device", raw.device, "gpu, cpu, gpu:INDEX or cpu:INDEX (default: the first GPU, else CPU)")
         ->type_name("DEVICE");
     run->add_option("--cache", raw.cache, "Directory for compiled kernels (default: tov in your cache directory)")
@@ -94,6 +104,16 @@ void refuseUnknownCommand(const CLI::App& app, int argc, const char* const* argv
                        "; the commands are " + join(names, ", "));
 }
 
+// For the last resample stage without a size of its own.
+void setSize(std::vector<Stage>& stages, const PixelSize& size) {
+    const auto wanted = [](const Stage& stage) { return stage.filter == kResampleFilter && !stage.size; };
+    const auto found = std::find_if(stages.rbegin(), stages.rend(), wanted);
+    if (found == stages.rend()) {
+        throw usageFailure("--size wants a resample stage without a size of its own: -f resample");
+    }
+    found->size = size;
+}
+
 RunCommand makeRun(const CLI::App& run, const RawArguments& raw) {
     RunCommand command{raw.input, {}, raw.output, std::nullopt, std::nullopt, raw.verbose};
     if (command.input.empty()) throw usageFailure("INPUT is empty");
@@ -102,6 +122,7 @@ RunCommand makeRun(const CLI::App& run, const RawArguments& raw) {
         command.stages.push_back(parseStage(text));
         filterType(command.stages.back().filter);
     }
+    if (run.count("--size") > 0) setSize(command.stages, parsePixelSize(raw.size, "--size"));
     if (run.count("--device") > 0) command.device = parseDevice(raw.device);
     if (run.count("--cache") > 0) command.cache = raw.cache;
     return command;

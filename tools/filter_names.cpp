@@ -44,6 +44,12 @@ constexpr std::array kColorSpaces = {
     NamedValue{"dcip3", TOV_COLOR_SPACE_DCIP3},
 };
 
+constexpr std::array kInterpolations = {
+    NamedValue{"box", TOV_INTERPOLATION_DOWNSAMPLE},
+    NamedValue{"bilinear", TOV_INTERPOLATION_BILINEAR},
+    NamedValue{"bicubic", TOV_INTERPOLATION_BICUBIC},
+};
+
 struct ParameterValues {
     const char* parameter;
     std::span<const NamedValue> values;
@@ -52,6 +58,7 @@ struct ParameterValues {
 constexpr std::array kParameterValues = {
     ParameterValues{"srcColorSpace", kColorSpaces},
     ParameterValues{"dstColorSpace", kColorSpaces},
+    ParameterValues{"interpOperator", kInterpolations},
 };
 
 }  // namespace

@@ -38,8 +38,10 @@ void execute(Streams& streams, const RunCommand& command) {
     const DeviceChoice device = chooseDevice(command.device);
     const Handle context = openDevice(device, cache.c_str());
     streams.forgetLibraryLines();
-    const std::vector<PreparedStage> stages = prepareStages(context.get(), command.stages);
-    Picture picture = readPicture(command.input);
+    std::vector<PreparedStage> stages = prepareStages(context.get(), command.stages);
+    Picture picture = readFileOrLayer(command.input);
+    AuxiliaryImages auxiliary(streams, context.get());
+    readImages(stages, auxiliary, {picture.width, picture.height}, command.input);
     if (command.verbose) {
         note("device " + deviceName(device) + ": " + describeDevice(context.get()));
         note("compiled kernels are kept in " + cache);

@@ -14,6 +14,9 @@ namespace tool {
 namespace {
 
 constexpr size_t kMatrixFloats = 16;
+constexpr size_t kMaxInputs = 6;
+constexpr const char* kInputCount = "inputsNum";
+constexpr std::string_view kWrittenImage = "outVarianceImg";
 
 const ParameterInfo& findParameter(const FilterInfo& info, const std::string& filter, const std::string& name) {
     const auto found = std::ranges::find(info.parameters, name, &ParameterInfo::name);
@@ -39,8 +42,39 @@ uint32_t uintValue(const std::string& parameter, const std::string& text, const 
     throw usageFailure(what + ": \"" + text + "\" is not one of its values" + hint + ": " + join(names, ", "));
 }
 
+std::vector<std::string> imageList(const std::string& text, const std::string& what) {
+    std::vector<std::string> sources;
+    for (const std::string_view source : split(text, '+')) {
+        if (source.empty()) throw usageFailure(what + ": \"" + text + "\" names no file beside a +");
+        sources.emplace_back(source);
+    }
+    if (sources.size() > kMaxInputs) {
+        throw usageFailure(what + ": " + std::to_string(sources.size()) + " pictures are given, at most " +
+                           std::to_string(kMaxInputs) + " are possible");
+    }
+    return sources;
+}
+
+// One number for each input, if any are given.
+void refuseUnequalLists(const Stage& stage, const ParameterData& data) {
+    const auto list = std::ranges::find(data.images, true, &ImageAssignment::array);
+    if (list == data.images.end()) return;
+    for (const std::vector<float>& numbers : data.arrays) {
+        if (numbers.size() == list->sources.size()) continue;
+        throw usageFailure(stage.filter + ": " + list->parameter + " has " + std::to_string(list->sources.size()) +
+                           " pictures, but the list of numbers has " + std::to_string(numbers.size()));
+    }
+}
+
+void setInputCount(tov_image_filter filter, const Stage& stage, const ParameterData& data) {
+    const auto list = std::ranges::find(data.images, true, &ImageAssignment::array);
+    if (list == data.images.end() || stage.sets(kInputCount)) return;
+    check(tovImageFilterSetParameter1u(filter, kInputCount, static_cast<uint32_t>(list->sources.size())),
+          "setting the number of inputs");
+}
+
 int32_t setValue(tov_image_filter filter, const ParameterInfo& parameter, const std::string& text,
-                 const std::string& what, FloatArrays& arrays) {
+                 const std::string& what, ParameterData& data) {
     const char* const name = parameter.name.c_str();
     switch (parameter.type) {
         case TOV_PARAMETER_TYPE_UINT1:
@@ -54,10 +88,19 @@ int32_t setValue(tov_image_filter filter, const ParameterInfo& parameter, const 
             return tovImageFilterSetParameter16f(filter, name, matrix.data());
         }
         case TOV_PARAMETER_TYPE_FLOAT_ARRAY: {
-            const std::vector<float>& values = arrays.emplace_back(parseFloatList(text, what));
+            const std::vector<float>& values = data.arrays.emplace_back(parseFloatList(text, what));
             return tovImageFilterSetParameterFloatArray(filter, name, values.data(),
                                                         static_cast<uint32_t>(values.size()));
         }
+        case TOV_PARAMETER_TYPE_IMAGE:
+            if (parameter.name == kWrittenImage) {
+                throw usageFailure(what + " is written by the filter, which the command line cannot make use of");
+            }
+            data.images.push_back({parameter.name, false, {text}});
+            return TOV_SUCCESS;
+        case TOV_PARAMETER_TYPE_IMAGE_ARRAY:
+            data.images.push_back({parameter.name, true, imageList(text, what)});
+            return TOV_SUCCESS;
         default:
             throw usageFailure(what + " takes a value of type " + typeName(parameter.type) +
                                ", which the command line cannot give");
@@ -66,13 +109,17 @@ int32_t setValue(tov_image_filter filter, const ParameterInfo& parameter, const 
 
 }  // namespace
 
-void setParameters(tov_image_filter filter, const Stage& stage, FloatArrays& arrays) {
+ParameterData setParameters(tov_image_filter filter, const Stage& stage) {
+    ParameterData data;
     const FilterInfo info = readFilterInfo(filter);
     for (const Assignment& assignment : stage.assignments) {
         const ParameterInfo& parameter = findParameter(info, stage.filter, assignment.parameter);
         const std::string what = stage.filter + ": " + assignment.parameter;
-        check(setValue(filter, parameter, assignment.value, what, arrays), "setting " + what);
+        check(setValue(filter, parameter, assignment.value, what, data), "setting " + what);
     }
+    refuseUnequalLists(stage, data);
+    setInputCount(filter, stage, data);
+    return data;
 }
 
 }  // namespace tool

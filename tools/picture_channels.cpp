@@ -2,7 +2,9 @@
 #include "picture_channels.h"
 
 #include <algorithm>
+#include <array>
 #include <initializer_list>
+#include <iterator>
 #include <string_view>
 
 namespace tool {
@@ -79,7 +81,72 @@ class Layers {
     std::vector<std::string> layers_;
 };
 
+char lower(char c) {
+    return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
+}
+
+struct NameTest {
+    bool anyCase;
+    bool ending;  // after a dot
+
+    bool operator()(std::string_view name, std::string_view wanted) const {
+        const auto same = [this](char a, char b) { return anyCase ? lower(a) == lower(b) : a == b; };
+        if (ending && name.size() > wanted.size()) {
+            name.remove_prefix(name.size() - wanted.size() - 1);
+            if (name.front() != '.') return false;
+            name.remove_prefix(1);
+        }
+        return std::ranges::equal(name, wanted, same);
+    }
+};
+
+// From the strictest to the most forgiving.
+constexpr std::array kNameTests = {NameTest{false, false}, NameTest{false, true}, NameTest{true, false},
+                                   NameTest{true, true}};
+
 }  // namespace
+
+std::vector<std::string> layerNames(const std::vector<std::string>& fileChannels) {
+    std::vector<std::string> names;
+    for (const std::string& channel : fileChannels) {
+        const ChannelName split = splitName(channel);
+        const std::string& name = split.layer.empty() ? split.name : split.layer;
+        if (std::ranges::find(names, name) == names.end()) names.push_back(name);
+    }
+    return names;
+}
+
+std::vector<int> findLayer(const std::vector<std::string>& fileChannels, const std::string& layer) {
+    std::vector<ChannelName> channels;
+    std::ranges::transform(fileChannels, std::back_inserter(channels), splitName);
+    for (const NameTest& test : kNameTests) {
+        const auto found = std::ranges::find_if(
+            channels, [&](const ChannelName& channel) { return !channel.layer.empty() && test(channel.layer, layer); });
+        if (found == channels.end()) continue;
+        std::vector<int> indices;
+        for (size_t i = 0; i < channels.size(); ++i) {
+            if (channels[i].layer == found->layer) indices.push_back(static_cast<int>(i));
+        }
+        return indices;
+    }
+    for (const NameTest& test : kNameTests) {
+        for (size_t i = 0; i < fileChannels.size(); ++i) {
+            if (test(fileChannels[i], layer)) return {static_cast<int>(i)};
+        }
+    }
+    return {};
+}
+
+std::optional<ChannelChoice> chooseChannels(const std::vector<std::string>& fileChannels,
+                                            const std::vector<int>& among) {
+    std::vector<std::string> names;
+    for (const int index : among) names.push_back(fileChannels[static_cast<size_t>(index)]);
+    auto choice = chooseChannels(names);
+    if (choice) {
+        for (int& index : choice->indices) index = among[static_cast<size_t>(index)];
+    }
+    return choice;
+}
 
 std::optional<ChannelChoice> chooseChannels(const std::vector<std::string>& fileChannels) {
     const Layers layers(fileChannels);

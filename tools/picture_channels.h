@@ -17,6 +17,17 @@ struct ChannelChoice {
 // names do not say how the channels make a picture.
 std::optional<ChannelChoice> chooseChannels(const std::vector<std::string>& fileChannels);
 
+// The layers in the order of the file: what stands before the last dot of a channel's name, else the name itself.
+std::vector<std::string> layerNames(const std::vector<std::string>& fileChannels);
+
+// Indices of the channels of a layer, given by its whole name or by what follows a dot in it, or of the one channel of
+// that name. Names in the same letter case are preferred. Empty when there is none.
+std::vector<int> findLayer(const std::vector<std::string>& fileChannels, const std::string& layer);
+
+// As chooseChannels, among these channels only.
+std::optional<ChannelChoice> chooseChannels(const std::vector<std::string>& fileChannels,
+                                            const std::vector<int>& among);
+
 }  // namespace tool
 
 #endif

@@ -7,8 +7,11 @@
 
 #include <algorithm>
 #include <filesystem>
+#include <iterator>
 #include <limits>
 #include <memory>
+#include <numeric>
+#include <utility>
 
 #include "failure.h"
 #include "picture_channels.h"
@@ -68,7 +71,7 @@ void refuseWhatIsNoPicture(const std::string& path, const OIIO::ImageSpec& spec)
 }
 
 ChannelChoice channelsOf(const std::string& path, const OIIO::ImageSpec& spec) {
-    const auto choice = chooseChannels(spec.channelnames);
+    auto choice = chooseChannels(spec.channelnames);
     if (!choice) {
         throw unreadable(path,
                          "its channels do not say how they make a picture (wanted: R, G, B and perhaps A, or one "
@@ -80,7 +83,7 @@ ChannelChoice channelsOf(const std::string& path, const OIIO::ImageSpec& spec) {
         for (const int index : choice->indices) used.push_back(spec.channelnames[static_cast<size_t>(index)]);
         note(path + ": of its " + std::to_string(spec.nchannels) + " channels, " + join(used, ", ") + " are used");
     }
-    return *choice;
+    return *std::move(choice);
 }
 
 // Gray becomes three equal colours, a missing alpha 1.
@@ -90,12 +93,13 @@ void spreadPixel(const float* stored, const std::vector<int>& offsets, float* rg
     rgba[3] = offsets.size() % 2 == 0 ? stored[offsets.back()] : 1.0f;
 }
 
-void readPixels(OIIO::ImageInput& input, const std::string& path, const std::vector<int>& indices, Picture& picture) {
+void readPixels(OIIO::ImageInput& input, int part, const std::string& path, const std::vector<int>& indices,
+                Picture& picture) {
     const auto [first, last] = std::ranges::minmax(indices);
     const auto stride = static_cast<size_t>(last - first + 1);
     std::vector<float> stored(picture.pixelCount() * stride);
     input.geterror();  // forget what opening left
-    const bool read = input.read_image(0, 0, first, last + 1, OIIO::TypeDesc::FLOAT, stored.data());
+    const bool read = input.read_image(part, 0, first, last + 1, OIIO::TypeDesc::FLOAT, stored.data());
     // Some readers fill what is missing of a damaged file, report success and leave only an error text.
     if (!read || input.has_error()) throw unreadable(path, oneLine(input.geterror()));
     std::vector<int> offsets = indices;
@@ -121,13 +125,9 @@ void applyOrientation(Picture& picture, int orientation) {
     picture.window = {};
 }
 
-}  // namespace
-
-Picture readPicture(const std::string& path) {
-    const auto input = open(path);
-    const OIIO::ImageSpec spec = input->spec();
+Picture readChannels(OIIO::ImageInput& input, int part, const std::string& path, ChannelChoice choice) {
+    const OIIO::ImageSpec spec = input.spec(part);
     refuseWhatIsNoPicture(path, spec);
-    ChannelChoice choice = channelsOf(path, spec);
     Picture picture{.width = static_cast<uint32_t>(spec.width),
                     .height = static_cast<uint32_t>(spec.height),
                     .pixels = {},
@@ -136,10 +136,88 @@ Picture readPicture(const std::string& path) {
                     .pixelAspect = spec.get_float_attribute("PixelAspectRatio", 1.0f),
                     .half = spec.channelformat(choice.indices.front()) == OIIO::TypeDesc::HALF,
                     .unassociatedAlpha = spec.get_int_attribute("oiio:UnassociatedAlpha") != 0};
-    readPixels(*input, path, choice.indices, picture);
+    readPixels(input, part, path, choice.indices, picture);
     applyOrientation(picture, spec.get_int_attribute("Orientation", 1));
+    return picture;
+}
+
+// A layer's channels in one of the parts of a file.
+struct LayerPlace {
+    int part = 0;
+    std::vector<int> channels;  // empty: no such layer
+};
+
+// The names of all layers are added to `names`, those of unnamed channels with their part's name.
+LayerPlace findLayerIn(OIIO::ImageInput& input, const std::string& layer, std::vector<std::string>& names) {
+    for (int part = 0; input.seek_subimage(part, 0); ++part) {
+        const OIIO::ImageSpec spec = input.spec(part);
+        std::vector<int> channels = findLayer(spec.channelnames, layer);
+        const std::string partName = spec.get_string_attribute("oiio:subimagename");
+        if (channels.empty() && !partName.empty() && partName == layer) {
+            channels.resize(spec.channelnames.size());
+            std::iota(channels.begin(), channels.end(), 0);
+        }
+        if (!channels.empty()) return {part, std::move(channels)};
+        if (!partName.empty()) names.push_back(partName);
+        std::ranges::copy(layerNames(spec.channelnames), std::back_inserter(names));
+    }
+    return {};
+}
+
+bool isFile(const std::string& path) {
+    std::error_code ignored;
+    return fs::is_regular_file(path, ignored);
+}
+
+}  // namespace
+
+Picture readPicture(const std::string& path) {
+    const auto input = open(path);
+    const OIIO::ImageSpec spec = input->spec();
+    refuseWhatIsNoPicture(path, spec);
+    Picture picture = readChannels(*input, 0, path, channelsOf(path, spec));
     if (input->seek_subimage(1, 0)) note(path + ": only the first of its pictures is used");
     return picture;
+}
+
+Picture readLayer(const std::string& path, const std::string& layer) {
+    const auto input = open(path);
+    std::vector<std::string> names;
+    const LayerPlace place = findLayerIn(*input, layer, names);
+    if (place.channels.empty()) {
+        throw unreadable(path, "it has no layer \"" + layer + "\"" + suggestion(layer, names) + "; its layers are " +
+                                   join(names, ", "));
+    }
+    const OIIO::ImageSpec spec = input->spec(place.part);
+    auto choice = chooseChannels(spec.channelnames, place.channels);
+    if (!choice) {
+        std::vector<std::string> channels;
+        for (const int index : place.channels) channels.push_back(spec.channelnames[static_cast<size_t>(index)]);
+        throw unreadable(path, "the channels of its layer \"" + layer +
+                                   "\" do not say how they make a picture: " + join(channels, ", "));
+    }
+    return readChannels(*input, place.part, path, *std::move(choice));
+}
+
+Picture readFileOrLayer(const std::string& source) {
+    if (isFile(source)) return readPicture(source);
+    for (size_t colon = source.rfind(':'); colon != std::string::npos && colon > 0;
+         colon = source.rfind(':', colon - 1)) {
+        const std::string path = source.substr(0, colon);
+        if (!isFile(path)) continue;
+        if (colon + 1 == source.size()) throw usageFailure(source + ": the name of the layer is missing");
+        return readLayer(path, source.substr(colon + 1));
+    }
+    return readPicture(source);
+}
+
+std::optional<std::string> firstLayer(const std::string& path, std::span<const std::string_view> names) {
+    const auto input = open(path);
+    std::vector<std::string> ignored;
+    for (const std::string_view name : names) {
+        if (!findLayerIn(*input, std::string(name), ignored).channels.empty()) return std::string(name);
+    }
+    return std::nullopt;
 }
 
 }  // namespace tool

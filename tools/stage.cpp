@@ -2,8 +2,10 @@
 #include "stage.h"
 
 #include <algorithm>
+#include <limits>
 
 #include "failure.h"
+#include "picture.h"
 #include "text.h"
 
 namespace tool {
@@ -33,11 +35,35 @@ Stage parseStage(std::string_view text) {
     if (colon == std::string_view::npos) return stage;
     for (const std::string_view part : split(text.substr(colon + 1), ',')) {
         Assignment assignment = parseAssignment(part, where);
-        if (stage.sets(assignment.parameter))
+        const bool isSize = stage.filter == kResampleFilter && assignment.parameter == "size";
+        if (stage.sets(assignment.parameter) || (isSize && stage.size))
             throw usageFailure(where + ": " + assignment.parameter + " is given twice");
-        stage.assignments.push_back(std::move(assignment));
+        if (isSize) {
+            stage.size = parsePixelSize(assignment.value, where + ": size");
+        } else {
+            stage.assignments.push_back(std::move(assignment));
+        }
     }
     return stage;
+}
+
+PixelSize parsePixelSize(std::string_view text, const std::string& what) {
+    const size_t cross = text.find('x');
+    if (cross == std::string_view::npos) {
+        throw usageFailure(what + ": \"" + std::string(text) + "\" is not of the form WIDTHxHEIGHT");
+    }
+    const PixelSize size{parseUint(text.substr(0, cross), what), parseUint(text.substr(cross + 1), what)};
+    if (size.width == 0 || size.height == 0) throw usageFailure(what + ": \"" + std::string(text) + "\" has no pixels");
+    constexpr uint64_t kMaxPixels = std::numeric_limits<uint32_t>::max() / (kComponents * sizeof(float));
+    if (uint64_t{size.width} * size.height > kMaxPixels) {
+        throw usageFailure(what + ": \"" + std::string(text) + "\" is too large; an image has at most " +
+                           std::to_string(kMaxPixels) + " pixels");
+    }
+    return size;
+}
+
+std::string describe(const PixelSize& size) {
+    return std::to_string(size.width) + " x " + std::to_string(size.height);
 }
 
 }  // namespace tool

@@ -64,7 +64,14 @@ INSTANTIATE_TEST_SUITE_P(
         stage("parameter given twice", "gamma_correction:cGamma=1,cGamma=2", {"cGamma is given twice"}),
         stage("misspelt parameter", "gamma_correction:cgama=2", {"did you mean cGamma?", "parameters are cGamma"}),
         stage("parameter of a filter without any", "sobel:x=1", {"it has none at all"}),
-        stage("image as a parameter", "weighted_sum:inputs=a.exr", {"inputs", "list of images"})));
+        stage("image that the filter writes", "temporal_accumulation:outVarianceImg=a.exr", {"written by the filter"}),
+        stage("list with a gap", "weighted_sum:inputs=a.exr++b.exr", {"names no file beside a +"}),
+        stage("too many pictures", "multiply:inputs=a+b+c+d+e+f+g", {"7 pictures are given, at most 6"}),
+        stage("more weights than pictures", "weighted_sum:inputs=a.exr+b.exr,weights=1+2+3",
+              {"inputs has 2 pictures", "the list of numbers has 3"}),
+        stage("size of another filter", "sobel:size=3x3", {"sobel has no parameter \"size\""}),
+        stage("size without a cross", "resample:size=30", {"\"30\" is not of the form WIDTHxHEIGHT"}),
+        stage("size given twice", "resample:size=3x3,size=4x4", {"size is given twice"})));
 
 INSTANTIATE_TEST_SUITE_P(
     Values, RefusedCommandLine,
@@ -76,6 +83,10 @@ INSTANTIATE_TEST_SUITE_P(
                     stage("negative for unsigned", "simple_tonemap:cApplyToneMap=-1", {"not a whole number"}),
                     stage("fraction for unsigned", "simple_tonemap:cApplyToneMap=0.5", {"not a whole number"}),
                     stage("too large for unsigned", "simple_tonemap:cApplyToneMap=4294967296", {"out of range"}),
+                    stage("empty size", "resample:size=0x5", {"has no pixels"}),
+                    stage("size beyond any image", "resample:size=20000x20000", {"too large", "268435455 pixels"}),
+                    stage("unknown interpolation", "resample:interpOperator=bicubical",
+                          {"did you mean bicubic?", "box (0), bilinear (1), bicubic (2)"}),
                     stage("misspelt colour space", "color_space:srcColorSpace=rec2021",
                           {"did you mean rec2020?", "srgb (1), adobe_rgb (2), rec2020 (3), dcip3 (4)"}),
                     stage("unknown colour space", "color_space:dstColorSpace=5", {"srgb (1)"}),
@@ -84,6 +95,7 @@ INSTANTIATE_TEST_SUITE_P(
 INSTANTIATE_TEST_SUITE_P(
     Places, RefusedCommandLine,
     testing::Values(run("unknown extension", {"-o", "out.foo"}, 5, {"\".foo\"", "exr", "png"}),
+                    run("size without a resample stage", {"-o", "out.png", "--size", "8x8"}, 2, {"resample stage"}),
                     run("no extension", {"-o", "out"}, 5, {"no extension"}),
                     run("extension of a writer that writes nothing", {"-o", "out.null"}, 5, {"\".null\""}),
                     run("missing directory", {"-o", "missing/out.png"}, 5, {"No such file or directory"}),
