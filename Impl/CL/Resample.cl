@@ -15,7 +15,7 @@ __kernel void ResampleKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer),
     GET_COORD(coord, min(cDstRes, GET_BUFFER_SIZE(dstBuffer)));
     // A source that is computed instead of stored has the size 0 here, and no bounds but the given ones.
     const int2 stored = GET_BUFFER_SIZE(srcBuffer);
-    const int2 extent = max(stored.x > 0 ? min(cSrcRes, stored) : cSrcRes, 0);
+    const int2 extent = max(stored.x > 0 ? min(cSrcRes, stored) : cSrcRes, (int2)(0));
 
 #if INTERPOLATION_OPERATOR == 0
     // Sizes that a host overrides may be of any magnitude, and so their ratios.
@@ -113,7 +113,7 @@ __kernel void ResampleKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer),
     if (corner.x % BLOCK_SIDE != 0 || corner.y % BLOCK_SIDE != 0 || corner.x >= limits.x || corner.y >= limits.y) {
         return;
     }
-    const int2 extent = max(min(cSrcRes, GET_BUFFER_SIZE(srcBuffer)), 0);
+    const int2 extent = max(min(cSrcRes, GET_BUFFER_SIZE(srcBuffer)), (int2)(0));
     const int columns = min(BLOCK_SIDE, limits.x - corner.x);
     const int rows = min(BLOCK_SIDE, limits.y - corner.y);
 

@@ -138,9 +138,9 @@ TEST_F(Oclgrind, ResamplingToLargerSmallerAndSinglePixels) {
 }
 
 TEST_F(Oclgrind, TheWaveletDenoiser) {
-    const Handle features = newImage(noise(11, 9));
-    run(TOV_IMAGE_FILTER_EAW_DENOISE, noise(11, 9));
-    runInPlace(TOV_IMAGE_FILTER_EAW_DENOISE, noise(11, 9),
+    const Handle features = newImage(noise(9, 5));
+    run(TOV_IMAGE_FILTER_EAW_DENOISE, noise(9, 5));
+    runInPlace(TOV_IMAGE_FILTER_EAW_DENOISE, noise(9, 5),
                {{"normalsImg", tov_image{features}},
                 {"depthImg", tov_image{features}},
                 {"transImg", tov_image{features}},
@@ -175,12 +175,12 @@ TEST_F(Oclgrind, MotionBuffers) {
 }
 
 TEST_F(Oclgrind, AccumulationOverSeveralFramesOfAMovingCamera) {
-    const Handle positions = newImage(noise(11, 9));
-    const Handle normals = newImage(noise(11, 9));
-    const Handle ids = newImage(noise(11, 9, kFloat1));
-    const Handle input = newImage(noise(11, 9));
-    const Handle output = newImage(Picture(11, 9));
-    const Handle variance = newImage(Picture(11, 9, kFloat1));
+    const Handle positions = newImage(noise(9, 4));
+    const Handle normals = newImage(noise(9, 4));
+    const Handle ids = newImage(noise(9, 4, kFloat1));
+    const Handle input = newImage(noise(9, 4));
+    const Handle output = newImage(Picture(9, 4));
+    const Handle variance = newImage(Picture(9, 4, kFloat1));
     const Handle filter = newFilter(TOV_IMAGE_FILTER_TEMPORAL_ACCUMULATION, {{"positionsImg", tov_image{positions}},
                                                                              {"normalsImg", tov_image{normals}},
                                                                              {"meshIdsImg", tov_image{ids}},
