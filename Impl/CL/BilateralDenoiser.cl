@@ -31,7 +31,7 @@ typedef float8 __attribute__((aligned(4))) EightValues;
 
 // Exp2 of common.cl for eight values that are not above 0; below -126 they give the smallest normal number.
 static inline void Exp2OfEight(float8* value) {
-    const float8 exponent = fmax(*value, -126.0f);
+    const float8 exponent = fmax(*value, (float8)(-126.0f));
     const int8 whole = as_int8(exponent + 12582912.0f) - 0x4b400000;
     const float8 f = exponent - convert_float8(whole);
     const float8 scale = as_float8((whole << 23) + 0x3f800000);
