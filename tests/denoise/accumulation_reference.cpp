@@ -117,7 +117,7 @@ const AccumulationReference::Pixel& AccumulationReference::at(int x, int y) cons
     return history_[static_cast<size_t>(v) * width_ + static_cast<size_t>(u)];
 }
 
-Rgba AccumulationReference::bilinear(Rgba Pixel::* slice, double x, double y) const {
+Rgba AccumulationReference::bilinear(Rgba Pixel::*slice, double x, double y) const {
     const int left = static_cast<int>(std::floor(x));
     const int top = static_cast<int>(std::floor(y));
     const double fx = x - left;

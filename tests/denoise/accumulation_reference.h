@@ -38,7 +38,7 @@ class AccumulationReference {
         apitest::Rgba color{};
     };
     const Pixel& at(int x, int y) const;
-    apitest::Rgba bilinear(apitest::Rgba Pixel::* slice, double x, double y) const;
+    apitest::Rgba bilinear(apitest::Rgba Pixel::*slice, double x, double y) const;
     bool historyColor(const Frame& frame, uint32_t x, uint32_t y, double u, double v, apitest::Rgba& color) const;
     void step(const Frame& frame, uint32_t x, uint32_t y, const std::array<double, 2>& motion, Pixel& out) const;
 

@@ -152,8 +152,8 @@ TEST_F(TemporalAccumulation, ChangedMeshIdsTurnedNormalsAndEmptyPositionsStartAf
     for (uint32_t i = 0; i < 3; ++i) accumulator.frame(frameFrom(0.0, i + 1));
     Frame last = frameFrom(0.0, 9);
     fillPixel(last.meshId, 4, 4, 12.0f);
-    last.normal.set(6, 4, {0.8, -0.6, 0.0, 1.0});   // 53 degrees
-    last.normal.set(8, 4, {0.6, -0.8, 0.0, 1.0});   // 37 degrees
+    last.normal.set(6, 4, {0.8, -0.6, 0.0, 1.0});  // 53 degrees
+    last.normal.set(8, 4, {0.6, -0.8, 0.0, 1.0});  // 37 degrees
     fillPixel(last.position, 12, 12, 0.0f);
     const Picture color = accumulator.frame(last).color;
     EXPECT_EQ(color.at(4, 4), last.color.at(4, 4));

@@ -83,7 +83,8 @@ class Level {
 
     double featureWeight(uint32_t u, uint32_t v, uint32_t x, uint32_t y, double rise) const {
         const double step = std::abs(read(inputs_.depth, u, v)[0] - read(inputs_.depth, x, y)[0]);
-        const double change = distance(divided(read(inputs_.transition, u, v)), divided(read(inputs_.transition, x, y)));
+        const double change =
+            distance(divided(read(inputs_.transition, u, v)), divided(read(inputs_.transition, x, y)));
         return normalWeight(read(inputs_.normal, u, v), read(inputs_.normal, x, y), inputs_.normalSigma) *
                std::exp(-step / (inputs_.depthSigma * rise + 0.001)) * std::exp(-change / inputs_.transSigma);
     }
@@ -92,8 +93,8 @@ class Level {
         std::array<double, 2> g = {0, 0};
         for (int i = -1; i <= 1; ++i) {
             for (int j = -1; j <= 1; ++j) {
-                const double depth = read(inputs_.depth, column(static_cast<int>(x) + j),
-                                          row(static_cast<int>(y) + i))[0];
+                const double depth =
+                    read(inputs_.depth, column(static_cast<int>(x) + j), row(static_cast<int>(y) + i))[0];
                 g[0] += kSobel[i + 1][j + 1] * depth;
                 g[1] += kSobel[j + 1][i + 1] * depth;
             }

@@ -99,9 +99,9 @@ TEST_F(WaveletDenoiser, StaysInsidePicturesBelowThirtyTwoPixels) {
     for (const auto& [width, height] : {std::pair{1u, 1u}, {3u, 31u}}) {
         SCOPED_TRACE(testing::Message() << width << " x " << height);
         const Scene scene = makeScene(width, height);
-        EXPECT_LT(apitest::maxDifference(filtered(scene.color, allOf(scene)),
-                                         waveletReference(scene.color, allOf(scene))),
-                  kTolerance);
+        EXPECT_LT(
+            apitest::maxDifference(filtered(scene.color, allOf(scene)), waveletReference(scene.color, allOf(scene))),
+            kTolerance);
     }
 }
 
@@ -145,7 +145,8 @@ TEST_F(WaveletDenoiser, FillsUnusablePixelsAndWholeHolesFromTheirNeighbours) {
 TEST_F(WaveletDenoiser, UnusableFeaturesMatchEachOtherOnly) {
     Scene scene = makeScene(45, 37);
     for (uint32_t y = 0; y < 37; ++y)
-        for (uint32_t x = 0; x < 45; ++x) scene.color.set(x, y, x < 24 ? Rgba{0.2, 0.2, 0.2, 1} : Rgba{0.9, 0.9, 0.9, 1});
+        for (uint32_t x = 0; x < 45; ++x)
+            scene.color.set(x, y, x < 24 ? Rgba{0.2, 0.2, 0.2, 1} : Rgba{0.9, 0.9, 0.9, 1});
     for (float& value : scene.variance.values) value = 100.0f;  // colour stops nothing
     for (uint32_t y = 0; y < 37; ++y)
         for (uint32_t x = 24; x < 45; ++x) fillPixel(scene.depth, x, y, kInfinity);
@@ -181,8 +182,8 @@ TEST_F(WaveletDenoiser, RefusesAnOutputOfAnotherFormatAndSigmasThatDivideByZero)
     EXPECT_NE(execute(filter, input, smaller), TOV_SUCCESS);
     for (const char* name : {"colorSigma", "normalSigma", "depthSigma", "transSigma"}) {
         const Handle zero = newFilter(TOV_IMAGE_FILTER_EAW_DENOISE, {{name, 0.0f}});
-        const std::string why = apitest::printedBy(
-            [&] { EXPECT_EQ(execute(zero, input, output), TOV_ERROR_INVALID_PARAMETER) << name; });
+        const std::string why =
+            apitest::printedBy([&] { EXPECT_EQ(execute(zero, input, output), TOV_ERROR_INVALID_PARAMETER) << name; });
         EXPECT_THAT(why, testing::HasSubstr(name));
     }
     EXPECT_EQ(execute(filter, input, output), TOV_SUCCESS);

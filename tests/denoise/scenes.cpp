@@ -32,8 +32,7 @@ Scene makeScene(uint32_t width, uint32_t height) {
         return apitest::painted(width, height, layout, color);
     };
     Scene scene;
-    scene.normal =
-        paint(apitest::kFloat4, [&](uint32_t x, uint32_t y) { return normalAt(x, y, width, height); });
+    scene.normal = paint(apitest::kFloat4, [&](uint32_t x, uint32_t y) { return normalAt(x, y, width, height); });
     scene.depth = paint({1, TOV_COMPONENT_TYPE_FLOAT32}, [&](uint32_t x, uint32_t y) {
         const double depth = depthAt(x, y, height);
         return Rgba{depth, depth, depth, 1.0};
