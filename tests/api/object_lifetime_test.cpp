@@ -8,6 +8,15 @@ namespace {
 
 constexpr tov_image_desc kDesc = {7, 5, 1, 0, 0, 4, TOV_COMPONENT_TYPE_FLOAT32};
 
+// AddressSanitizer keeps freed memory aside, so no address comes back.
+#if defined(__SANITIZE_ADDRESS__)
+constexpr bool kAddressesRepeat = false;
+#elif defined(__has_feature)
+constexpr bool kAddressesRepeat = !__has_feature(address_sanitizer);
+#else
+constexpr bool kAddressesRepeat = true;
+#endif
+
 class ObjectLifetime : public DeviceTest {
  protected:
     // Creates objects until one receives the address, which the deleted object's memory makes likely.
@@ -75,6 +84,7 @@ TEST_F(ObjectLifetime, ABoundImageThatWasDeletedIsRecognisedAlsoAtAnAddressInUse
     const tov_object address = input.remove();
     EXPECT_EQ(execute(queue), TOV_ERROR_INVALID_IMAGE);
 
+    if (!kAddressesRepeat) return;
     std::vector<Handle> others;
     ASSERT_TRUE(reuseAddress(address, others, [] { return newImage(kDesc); }));
     EXPECT_EQ(execute(queue), TOV_ERROR_INVALID_IMAGE);
@@ -90,6 +100,7 @@ TEST_F(ObjectLifetime, AnAttachedFilterThatWasDeletedIsRecognisedAlsoAtAnAddress
     const tov_object address = filter.remove();
     EXPECT_EQ(execute(queue), TOV_ERROR_INVALID_FILTER);
 
+    if (!kAddressesRepeat) return;
     std::vector<Handle> others;
     ASSERT_TRUE(reuseAddress(address, others, [] { return newFilter(TOV_IMAGE_FILTER_LINEAR_TONEMAP); }));
     EXPECT_EQ(execute(queue), TOV_ERROR_INVALID_FILTER);
