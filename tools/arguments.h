@@ -7,6 +7,7 @@
 #include <variant>
 #include <vector>
 
+#include "denoise.h"
 #include "devices.h"
 #include "stage.h"
 
@@ -24,16 +25,27 @@ struct FiltersCommand {
     bool markdown = false;
 };
 
-struct RunCommand {
+// What all work on pictures has in common.
+struct WorkArguments {
     std::string input;
-    std::vector<Stage> stages;
     std::string output;
     std::optional<DeviceChoice> device;
     std::optional<std::string> cache;
     bool verbose = false;
 };
 
-using Command = std::variant<PrintCommand, DevicesCommand, FiltersCommand, RunCommand>;
+struct RunCommand {
+    WorkArguments work;
+    std::vector<Stage> stages;
+    bool fuse = false;
+};
+
+struct DenoiseCommand {
+    WorkArguments work;
+    DenoiseOptions options;
+};
+
+using Command = std::variant<PrintCommand, DevicesCommand, FiltersCommand, RunCommand, DenoiseCommand>;
 
 // Throws a usage failure for what the command line alone shows to be wrong, names of filters included.
 Command parseArguments(int argc, const char* const* argv);

@@ -15,6 +15,13 @@ void clearAlpha(Picture& picture) {
 
 }  // namespace
 
+void refuseOtherSize(const std::string& name, const PixelSize& size, const std::string& pictureName,
+                     const PixelSize& pictureSize) {
+    if (size == pictureSize) return;
+    throw usageFailure(name + " has " + describe(size) + " pixels, but " + pictureName + " has " +
+                       describe(pictureSize) + ": pictures that a filter reads beside its input must be as large");
+}
+
 void AuxiliaryImages::add(const std::string& name, const Picture& picture) {
     made_[name] = {{picture.width, picture.height}, uploadPicture(*streams_, context_, picture, name)};
 }
@@ -32,10 +39,7 @@ tov_image AuxiliaryImages::get(const std::string& source, MissingAlpha missingAl
                                const std::string& pictureName) {
     const auto made = made_.find(source);
     const auto& [size, image] = made == made_.end() ? read(source, missingAlpha) : made->second;
-    if (size != expected) {
-        throw usageFailure(source + " has " + describe(size) + " pixels, but " + pictureName + " has " +
-                           describe(expected) + ": pictures that a filter reads beside its input must be as large");
-    }
+    refuseOtherSize(source, size, pictureName, expected);
     return image.get();
 }
 

@@ -17,6 +17,10 @@ namespace tool {
 // not see a constant 1 there.
 enum class MissingAlpha { kOne, kZero };
 
+// Throws a usage failure that names both pictures and their sizes, where these differ.
+void refuseOtherSize(const std::string& name, const PixelSize& size, const std::string& pictureName,
+                     const PixelSize& pictureSize);
+
 // On the device, each file (or layer of one) once.
 class AuxiliaryImages {
  public:

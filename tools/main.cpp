@@ -30,27 +30,53 @@ void execute(Streams& streams, const FiltersCommand& command) {
     streams.result(listFilters(context.get(), command.filter, command.markdown));
 }
 
-// Whatever can be found wrong is found before the first pixel is worked on.
-void execute(Streams& streams, const RunCommand& command) {
-    streams.setVerbose(command.verbose);
-    PictureWriter writer(command.output);
-    const std::string cache = cacheDirectory(command.cache);
-    const DeviceChoice device = chooseDevice(command.device);
-    const Handle context = openDevice(device, cache.c_str());
+Handle openForWork(Streams& streams, const WorkArguments& work) {
+    const std::string cache = cacheDirectory(work.cache);
+    const DeviceChoice device = chooseDevice(work.device);
+    Handle context = openDevice(device, cache.c_str());
     streams.forgetLibraryLines();
-    std::vector<PreparedStage> stages = prepareStages(context.get(), command.stages);
-    Picture picture = readFileOrLayer(command.input);
-    AuxiliaryImages auxiliary(streams, context.get());
-    readImages(stages, auxiliary, {picture.width, picture.height}, command.input);
-    if (command.verbose) {
+    if (work.verbose) {
         note("device " + deviceName(device) + ": " + describeDevice(context.get()));
         note("compiled kernels are kept in " + cache);
-        note(command.input + ": " + std::to_string(picture.width) + " x " + std::to_string(picture.height) +
-             " pixels, " + std::to_string(picture.channels.size()) + " channels");
     }
-    runStages(streams, context.get(), stages, picture);
+    return context;
+}
+
+void tellOfPicture(const WorkArguments& work, const Picture& picture) {
+    if (!work.verbose) return;
+    note(work.input + ": " + std::to_string(picture.width) + " x " + std::to_string(picture.height) + " pixels, " +
+         std::to_string(picture.channels.size()) + " channels");
+}
+
+void write(PictureWriter& writer, const WorkArguments& work, const Picture& picture) {
     writer.write(picture);
-    if (command.verbose) note("wrote " + command.output);
+    if (work.verbose) note("wrote " + work.output);
+}
+
+// Whatever can be found wrong is found before the first pixel is worked on.
+void execute(Streams& streams, const RunCommand& command) {
+    const WorkArguments& work = command.work;
+    streams.setVerbose(work.verbose);
+    PictureWriter writer(work.output);
+    const Handle context = openForWork(streams, work);
+    std::vector<PreparedStage> stages = prepareStages(context.get(), command.stages);
+    Picture picture = readFileOrLayer(work.input);
+    tellOfPicture(work, picture);
+    AuxiliaryImages auxiliary(streams, context.get());
+    readImages(stages, auxiliary, {picture.width, picture.height}, work.input);
+    runStages(streams, context.get(), stages, command.fuse, picture);
+    write(writer, work, picture);
+}
+
+void execute(Streams& streams, const DenoiseCommand& command) {
+    const WorkArguments& work = command.work;
+    streams.setVerbose(work.verbose);
+    PictureWriter writer(work.output);
+    const Handle context = openForWork(streams, work);
+    DenoiseInputs inputs = readDenoiseInputs(work.input, command.options);
+    tellOfPicture(work, inputs.color);
+    denoise(streams, context.get(), inputs, command.options);
+    write(writer, work, inputs.color);
 }
 
 ExitStatus runTool(Streams& streams, int argc, const char* const* argv) {

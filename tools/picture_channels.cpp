@@ -129,8 +129,16 @@ std::vector<int> findLayer(const std::vector<std::string>& fileChannels, const s
         }
         return indices;
     }
+    // A component of a vector is no picture of its own, unless asked for by its whole name.
+    const auto ofVector = [&](const ChannelName& channel) {
+        const auto isX = [&](const ChannelName& other) {
+            return other.layer == channel.layer && lower(other.name[0]) == 'x';
+        };
+        return channel.name.size() == 1 && lower(channel.name[0]) != 'x' && std::ranges::any_of(channels, isX);
+    };
     for (const NameTest& test : kNameTests) {
         for (size_t i = 0; i < fileChannels.size(); ++i) {
+            if (test.ending && ofVector(channels[i])) continue;
             if (test(fileChannels[i], layer)) return {static_cast<int>(i)};
         }
     }

@@ -164,11 +164,6 @@ LayerPlace findLayerIn(OIIO::ImageInput& input, const std::string& layer, std::v
     return {};
 }
 
-bool isFile(const std::string& path) {
-    std::error_code ignored;
-    return fs::is_regular_file(path, ignored);
-}
-
 }  // namespace
 
 Picture readPicture(const std::string& path) {
@@ -199,12 +194,20 @@ Picture readLayer(const std::string& path, const std::string& layer) {
     return readChannels(*input, place.part, path, *std::move(choice));
 }
 
-Picture readFileOrLayer(const std::string& source) {
-    if (isFile(source)) return readPicture(source);
+bool isPictureFile(const std::string& source) {
+    std::error_code ignored;
+    return fs::is_regular_file(source, ignored);
+}
+
+Picture readFileOrLayer(const std::string& source, std::span<const std::string_view> preferred) {
+    if (isPictureFile(source)) {
+        const auto layer = firstLayer(source, preferred);
+        return layer ? readLayer(source, *layer) : readPicture(source);
+    }
     for (size_t colon = source.rfind(':'); colon != std::string::npos && colon > 0;
          colon = source.rfind(':', colon - 1)) {
         const std::string path = source.substr(0, colon);
-        if (!isFile(path)) continue;
+        if (!isPictureFile(path)) continue;
         if (colon + 1 == source.size()) throw usageFailure(source + ": the name of the layer is missing");
         return readLayer(path, source.substr(colon + 1));
     }

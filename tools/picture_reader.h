@@ -20,7 +20,11 @@ Picture readPicture(const std::string& path);
 Picture readLayer(const std::string& path, const std::string& layer);
 
 // "FILE" or "FILE:LAYER": where no file has the whole name, the layer follows the last colon that has a file before it.
-Picture readFileOrLayer(const std::string& source);
+// Of a file alone the first of the preferred layers that it has, else the picture as readPicture finds it.
+Picture readFileOrLayer(const std::string& source, std::span<const std::string_view> preferred = {});
+
+// Whether it is the name of a file, rather than of a layer in one.
+bool isPictureFile(const std::string& source);
 
 // The first of these names of layers for which the file has one. Throws kUnreadable.
 std::optional<std::string> firstLayer(const std::string& path, std::span<const std::string_view> names);

@@ -1,4 +1,4 @@
-// Each stage is a queue of its own, so that a filter can be given values measured on its very input.
+// Each group of stages is a queue of its own, so that a filter can be given values measured on its very input.
 #include "pipeline.h"
 
 #include <unistd.h>
@@ -13,6 +13,7 @@
 #include "failure.h"
 #include "filter_info.h"
 #include "luminance.h"
+#include "stage_groups.h"
 #include "text.h"
 
 namespace tool {
@@ -24,18 +25,12 @@ struct MeasuredParameter {
     float Luminance::*value;
 };
 
-constexpr const char* kMeasuredFilter = "drago_tonemap";
 constexpr std::array kMeasuredParameters = {MeasuredParameter{"avLum", &Luminance::average},
                                             MeasuredParameter{"maxLum", &Luminance::maximum}};
 
 // Filters take the length of all four components of some of these.
 constexpr std::array<std::string_view, 5> kVarianceParameters = {"colorVar", "vColorImg", "vTransImg", "vNormalsImg",
                                                                  "vDepthImg"};
-
-bool needsMeasuring(const Stage& stage) {
-    if (stage.filter != kMeasuredFilter) return false;
-    return !stage.sets(kMeasuredParameters[0].name) || !stage.sets(kMeasuredParameters[1].name);
-}
 
 // Black stays black whatever the luminance is taken to be, so a black picture, say of a fade, is no failure.
 void setMeasured(const PreparedStage& prepared, Luminance luminance) {
@@ -79,26 +74,55 @@ void bindImages(PreparedStage& prepared, tov_image input) {
     }
 }
 
+// Stages that run at once, and how the user calls them.
+using Group = std::span<PreparedStage>;
+
+std::string namesOf(const Group& group) {
+    std::string names;
+    for (const PreparedStage& prepared : group) names += (names.empty() ? "" : ", ") + prepared.stage.filter;
+    return names;
+}
+
 // Filters ask for scratch memory of their own when they run.
-void checkRun(Streams& streams, tov_context context, int32_t code, const Stage& stage, const DeviceImages& images) {
+void checkRun(Streams& streams, tov_context context, int32_t code, const std::string& names,
+              const DeviceImages& images) {
     const std::string lines = streams.takeLibraryLines();
-    if (code != TOV_ERROR_INTERNAL_ERROR || !tellOfMissingMemory(lines)) return check(code, "running " + stage.filter);
+    if (code != TOV_ERROR_INTERNAL_ERROR || !tellOfMissingMemory(lines)) return check(code, "running " + names);
     const uint64_t available = availableBytes(streams, context, 1, images.bytes());
-    throw Failure(ExitStatus::kFailed, "the picture is too big for the device: " + stage.filter +
+    throw Failure(ExitStatus::kFailed, "the picture is too big for the device: " + names +
                                            " needs more memory beside the " + std::to_string(images.bytes()) +
                                            " bytes of its input and output than the " + std::to_string(available) +
                                            " bytes still available (" + lines.substr(0, lines.find('\n')) + ")");
 }
 
-void runStage(Streams& streams, tov_context context, PreparedStage& prepared, DeviceImages& images) {
-    images.setOtherSize(prepared.stage.size.value_or(images.size()));
-    bindImages(prepared, images.current());
+// Makes every filter of the group the input of the next. Returns the input of the last, which is still to be attached,
+// and sets `size` to the size of its output.
+tov_image bindGroup(const Group& group, tov_image input, PixelSize& size) {
+    for (PreparedStage& prepared : group) {
+        size = prepared.stage.size.value_or(size);
+        bindImages(prepared, input);
+        if (&prepared == &group.back()) break;
+        tov_image_filter const filter = prepared.filter.get();
+        check(tovImageFilterSetParameterImage(filter, "srcBuffer", input), "feeding " + prepared.stage.filter);
+        if (prepared.stage.filter == kResampleFilter) {
+            check(tovImageFilterSetParameter2u(filter, "dstRec", size.width, size.height), "setting a size");
+        }
+        input = filter;
+    }
+    return input;
+}
+
+void runGroup(Streams& streams, tov_context context, const Group& group, DeviceImages& images) {
+    const std::string names = namesOf(group);
+    PixelSize size = images.size();
+    const tov_image input = bindGroup(group, images.current(), size);
+    images.setOtherSize(size);
     tov_command_queue queue = nullptr;
     check(tovContextCreateCommandQueue(context, &queue), "making a command queue");
     const Handle owner(queue);
-    check(tovCommandQueueAttachImageFilter(queue, prepared.filter.get(), images.current(), images.other()),
-          "attaching " + prepared.stage.filter);
-    checkRun(streams, context, tovContextExecuteCommandQueue(context, queue, nullptr, nullptr), prepared.stage, images);
+    check(tovCommandQueueAttachImageFilter(queue, group.back().filter.get(), input, images.other()),
+          "attaching " + group.back().stage.filter);
+    checkRun(streams, context, tovContextExecuteCommandQueue(context, queue, nullptr, nullptr), names, images);
     images.swap();
 }
 
@@ -137,19 +161,26 @@ void readImages(std::vector<PreparedStage>& stages, AuxiliaryImages& auxiliary, 
     }
 }
 
-void runStages(Streams& streams, tov_context context, std::vector<PreparedStage>& stages, Picture& picture) {
+void runStages(Streams& streams, tov_context context, std::vector<PreparedStage>& stages, bool fuse, Picture& picture) {
     using Clock = std::chrono::steady_clock;
     const bool progress = showsProgress(streams, picture);
     DeviceImages images(streams, context, picture);
-    for (size_t i = 0; i < stages.size(); ++i) {
-        if (needsMeasuring(stages[i].stage)) measure(stages[i], images);
+    std::vector<Stage> plain;
+    for (const PreparedStage& prepared : stages) plain.push_back(prepared.stage);
+    size_t first = 0;
+    for (const size_t count : groupStages(plain, fuse)) {
+        const Group group = std::span(stages).subspan(first, count);
+        if (measuresInput(group.front().stage)) measure(group.front(), images);
         const Clock::time_point start = Clock::now();
-        runStage(streams, context, stages[i], images);
+        runGroup(streams, context, group, images);
         const std::chrono::duration<double, std::milli> elapsed = Clock::now() - start;
-        if (progress) {
-            note("stage " + std::to_string(i + 1) + " of " + std::to_string(stages.size()) + ": " +
-                 stages[i].stage.filter + ", " + formatTenths(elapsed.count()) + " ms");
-        }
+        const std::string number = std::to_string(first + 1);
+        first += count;
+        if (!progress) continue;
+        const std::string numbers =
+            count == 1 ? "stage " + number : "stages " + number + " to " + std::to_string(first);
+        note(numbers + " of " + std::to_string(stages.size()) + (count == 1 ? ": " : ", fused: ") + namesOf(group) +
+             ", " + formatTenths(elapsed.count()) + " ms");
     }
     images.download(picture);
 }

@@ -29,8 +29,9 @@ std::vector<PreparedStage> prepareStages(tov_context context, const std::vector<
 void readImages(std::vector<PreparedStage>& stages, AuxiliaryImages& auxiliary, PixelSize size,
                 const std::string& name);
 
-// Replaces the picture's pixels by the last stage's output. Throws kFailed.
-void runStages(Streams& streams, tov_context context, std::vector<PreparedStage>& stages, Picture& picture);
+// Replaces the picture's pixels by the last stage's output; with `fuse`, neighbouring stages that can be are computed
+// by one kernel. Throws kFailed.
+void runStages(Streams& streams, tov_context context, std::vector<PreparedStage>& stages, bool fuse, Picture& picture);
 
 }  // namespace tool
 

@@ -46,8 +46,8 @@ Refusal run(const char* what, std::vector<std::string> more, int status, std::ve
 
 INSTANTIATE_TEST_SUITE_P(
     Commands, RefusedCommandLine,
-    testing::Values(Refusal{"none", {}, 2, {"devices, filters, run"}},
-                    Refusal{"unknown", {"rnu"}, 2, {"\"rnu\"", "did you mean run?", "devices, filters, run"}},
+    testing::Values(Refusal{"none", {}, 2, {"devices, filters, run, denoise"}},
+                    Refusal{"unknown", {"rnu"}, 2, {"\"rnu\"", "did you mean run?", "devices, filters, run, denoise"}},
                     Refusal{"no input", {"run"}, 2, {"INPUT"}},
                     Refusal{"no filter", {"run", kRender, "-o", "out.png"}, 2, {"--filter"}},
                     Refusal{"unknown option", {"devices", "--fast"}, 2, {"--fast"}},
@@ -110,7 +110,7 @@ INSTANTIATE_TEST_SUITE_P(
                     run("file as cache", {"-o", "out.png", "--cache", kRender}, 1, {"Not a directory"})));
 
 TEST(CommandLine, HelpAndVersionGoToStandardOutput) {
-    for (const char* command : {"", "devices", "filters", "run"}) {
+    for (const char* command : {"", "devices", "filters", "run", "denoise"}) {
         std::vector<std::string> arguments;
         if (*command != '\0') arguments.emplace_back(command);
         arguments.emplace_back("--help");

@@ -72,6 +72,8 @@ TEST_F(Images, LayersAreFoundByWholeNameEndOrChannel) {
     EXPECT_EQ(tool::findLayer(channels, "DEPTH"), (Indices{3}));
     EXPECT_EQ(tool::findLayer(channels, "A.Depth.Z"), (Indices{3}));
     EXPECT_EQ(tool::findLayer(channels, "R"), (Indices{4}));
+    EXPECT_EQ(tool::findLayer({"N.X", "N.Y", "N.Z"}, "Z"), Indices{});
+    EXPECT_EQ(tool::findLayer({"N.X", "N.Y", "N.Z", "V.R", "V.Z"}, "Z"), (Indices{4}));
     EXPECT_EQ(tool::findLayer(channels, "ormal"), Indices{});
     EXPECT_EQ(tool::findLayer(channels, ""), Indices{});
 }
