@@ -73,8 +73,6 @@ void FilterTree::visit(TovImageFilter& filter, const Size& outputSize, bool read
     if (inner) {
         requireFusable(filter);
         setInnerSizes(filter, outputSize);
-    } else {
-        setSourceSize(filter);
     }
     visitInputs(filter, outputSize, nodes_.back().readsAround);
 }
@@ -93,13 +91,6 @@ void FilterTree::visitInputs(TovImageFilter& filter, const Size& outputSize, boo
             visit(*input, size, readsAround);
         }
     }
-}
-
-// Only a resampling filter works on a part of its input. The others index memory by the input's size, which nothing
-// that the host says may change.
-void FilterTree::setSourceSize(TovImageFilter& root) {
-    const TovImage* input = root.find("srcBuffer")->boundImage();
-    if (input != nullptr && !isScaling(root)) root.find("srcBufferSize")->setRunSize({input->width(), input->height()});
 }
 
 // A filter that feeds two others gives both the same pixels, so both must read the same size.

@@ -32,7 +32,6 @@ class FilterTree {
  private:
     void visit(TovImageFilter& filter, const Size& outputSize, bool readsAround);
     void visitInputs(TovImageFilter& filter, const Size& outputSize, bool readsAround);
-    static void setSourceSize(TovImageFilter& root);
     void setInnerSizes(TovImageFilter& filter, const Size& outputSize);
     Size naturalSize(TovImageFilter& filter);
     void clearSizes() noexcept;
