@@ -25,6 +25,6 @@ using Matrix3 = std::array<float, 9>;  // row after row
 Matrix3 rgbToXyz(const TovColorSpaceGamut& gamut) noexcept;
 
 // Adjugate over determinant; no test for singularity.
-Matrix3 inverse(const Matrix3& matrix) noexcept;
+Matrix3 inverse(const Matrix3& a) noexcept;
 
 }  // namespace ColorTools
