@@ -38,7 +38,7 @@ WaveletSettings waveletSettings(float noise, bool hasFeatures) {
 
 RegressionSettings regressionSettings(bool hasFeatures) {
     // Without features nothing but the fit itself keeps edges: wide windows blur.
-    return hasFeatures ? RegressionSettings{4, 8, 2.0f} : RegressionSettings{4, 4, 1.0f};
+    return hasFeatures ? RegressionSettings{4, 8, 2.0f} : RegressionSettings{4, 4, 0.8f};
 }
 
 }  // namespace tool
