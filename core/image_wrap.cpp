@@ -10,6 +10,7 @@ namespace {
 template <class Value>
 std::optional<Value> memoryInfo(cl_mem memory, cl_mem_info key) {
     Value value{};
+    // NOLINTNEXTLINE(bugprone-sizeof-expression): some of the values are handles
     if (zor::cl().clGetMemObjectInfo(memory, key, sizeof value, &value, nullptr) != CL_SUCCESS) return std::nullopt;
     return value;
 }
@@ -62,7 +63,7 @@ void requireImage(cl_mem memory, size_t width, size_t height) {
 
 void TovImage::placeBuffer(cl_mem memory, uint64_t size) {
     placement_ = {memory, 0, size};
-    const cl_mem parent = memoryInfo<cl_mem>(memory, CL_MEM_ASSOCIATED_MEMOBJECT).value_or(nullptr);
+    auto* const parent = memoryInfo<cl_mem>(memory, CL_MEM_ASSOCIATED_MEMOBJECT).value_or(nullptr);
     if (parent != nullptr) placement_ = {parent, memoryInfo<size_t>(memory, CL_MEM_OFFSET).value_or(0), size};
 }
 
@@ -70,7 +71,7 @@ void TovImage::wrapOpenClMemory(cl_mem memory, bool isImage) {
     storage_.reset();
     external_ = true;
     const uint64_t size = requireSize(memory);
-    const cl_context context = device_->getContext();
+    auto* const context = device_->getContext();
     if (memoryInfo<cl_context>(memory, CL_MEM_CONTEXT).value_or(context) != context)
         refuseMemory("The memory object belongs to another OpenCL context");
     if (isImage) {
