@@ -4,13 +4,14 @@
 
 DevicePointer ownDevice(zor::Device* device) {
     if (device == nullptr) return {};
-    return DevicePointer(device, [](zor::Device* last) {
-        try {
-            zor::destroyDevice(last);
-        } catch (...) {
-            // Whoever deletes the last handle can do nothing about a driver that refuses; its line has been printed.
-        }
-    });
+    return {device, [](zor::Device* last) {
+                try {
+                    zor::destroyDevice(last);
+                } catch (...) {
+                    // Whoever deletes the last handle can do nothing about a driver that refuses; its line has been
+                    // printed.
+                }
+            }};
 }
 
 TovContext::TovContext(DevicePointer device, const char* cachePath)

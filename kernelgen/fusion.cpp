@@ -63,11 +63,11 @@ class Renaming {
 
     // The identifier's new form; itself when it is none of the names.
     std::string renamed(const std::string& identifier) const {
-        if (names_.count(identifier) != 0 || arrays_.count(identifier) != 0) return identifier + suffix_;
+        if (names_.contains(identifier) || arrays_.contains(identifier)) return identifier + suffix_;
         for (const std::string_view ending : kLayoutEndings) {
             if (!identifier.ends_with(ending)) continue;
             const std::string name = identifier.substr(0, identifier.size() - ending.size());
-            if (names_.count(name) != 0) return name + suffix_ + std::string(ending);
+            if (names_.contains(name)) return name + suffix_ + std::string(ending);
             return renamedElement(name) + std::string(ending);
         }
         return renamedElement(identifier);
@@ -91,7 +91,7 @@ class Renaming {
     // "input2" of the array "input" becomes "input<suffix>2".
     std::string renamedElement(const std::string& identifier) const {
         const size_t digits = identifier.find_last_not_of("0123456789") + 1;
-        if (digits == identifier.size() || arrays_.count(identifier.substr(0, digits)) == 0) return identifier;
+        if (digits == identifier.size() || !arrays_.contains(identifier.substr(0, digits))) return identifier;
         return identifier.substr(0, digits) + suffix_ + identifier.substr(digits);
     }
 
@@ -176,8 +176,8 @@ class TreeFusion {
         if (level != 0) RenameKernel(code, std::to_string(level));
         std::vector<Merge> merges = expandArguments(code, pass, level);
         // From the last to the first, so that no merge moves the position of another.
-        for (auto merge = merges.rbegin(); merge != merges.rend(); ++merge)
-            MergeImageArgument(code, merge->position, merge->inner);
+        std::reverse(merges.begin(), merges.end());
+        for (const Merge& merge : merges) MergeImageArgument(code, merge.position, merge.inner);
         return code;
     }
 

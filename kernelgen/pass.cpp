@@ -27,7 +27,7 @@ bool isQuarrion(const zor::Device& device) {
     std::array<char, zor::kDeviceTextBytes> vendor{};
     device.getVendorName(vendor.data());
     const std::string_view text(vendor.data());
-    return text.find("QUARRION") != text.npos || text.find("Quarrion") != text.npos;
+    return text.find("QUARRION") != std::string_view::npos || text.find("Quarrion") != std::string_view::npos;
 }
 
 int32_t requireLaunchable(uint64_t items) {

@@ -30,7 +30,7 @@ MemoryHandle createImageLike(Device& device, cl_mem image) {
 void copyImage(Device& device, cl_mem from, cl_mem to) {
     const size_t origin[3] = {0, 0, 0};
     const size_t region[3] = {imageInfo<size_t>(from, CL_IMAGE_WIDTH), imageInfo<size_t>(from, CL_IMAGE_HEIGHT), 1};
-    const cl_command_queue queue = requireOpenCL(device, "copyImage").queue();
+    auto* const queue = requireOpenCL(device, "copyImage").queue();
     check(cl().clEnqueueCopyImage(queue, from, to, &origin[0], &origin[0], &region[0], 0, nullptr, nullptr),
           "clEnqueueCopyImage");
     device.finish();
