@@ -23,6 +23,6 @@ void TovQueue::detach(TovImageFilter& filter) {
 }
 
 void TovQueue::execute() {
-    for (size_t i = 0; i < filters_.size(); ++i) require<TovImageFilter>(filters_[i]).apply();
+    for (const ObjectRef& filter : filters_) require<TovImageFilter>(filter).apply();
     device_->finish();
 }
