@@ -8,6 +8,7 @@
 #include <string_view>
 
 #include "child.h"
+#include "denoisers.h"
 #include "handle.h"
 #include "host_cost.h"
 #include "opencl.h"
@@ -27,7 +28,7 @@ struct Options {
 
 constexpr char kUsage[] =
     "usage: tov_bench [--device=gpu|cpu[:INDEX]] [--benchmark_filter=REGEX] [--benchmark_out=FILE.json] ...\n"
-    "Without a device: the first GPU, else the first CPU. Groups: throughput/, startup/, creation/, host/.\n";
+    "Without a device: the first GPU, else the first CPU. Groups: throughput/, arithmetic/, startup/, creation/, host/.\n";
 
 Options parse(int count, char** texts) {
     Options options;
@@ -69,6 +70,7 @@ int runAll(const std::string& deviceOption) {
     const OpenCL opencl(choice);
     const Handle context = adoptContext(opencl, cache.path());
     registerThroughput(opencl, context.get());
+    registerDenoisers(opencl, context.get());
     registerStartup(choice);
     registerHostCost(opencl, context.get(), cache.path());
     TableReporter reporter(out, choice.text() + ", " + opencl.deviceText());

@@ -158,6 +158,15 @@ TEST_F(Oclgrind, TheRegressionDenoiser) {
          {"normalsImg", tov_image{features}},
          {"depthImg", tov_image{features}}});
     run(TOV_IMAGE_FILTER_LWR_DENOISE, noise(1, 1), {{"halfWindow", 3u}});
+    // All nine directions in use: random features in windows of 15 to 25 pixels.
+    const Handle depth = newImage(noise(5, 5, kFloat4, 1.0, 2));
+    const Handle normals = newImage(noise(5, 5, kFloat4, 1.0, 3));
+    const Handle transition = newImage(noise(5, 5, kFloat4, 1.0, 4));
+    run(TOV_IMAGE_FILTER_LWR_DENOISE, noise(5, 5),
+        {{"halfWindow", 2u},
+         {"transImg", tov_image{transition}},
+         {"normalsImg", tov_image{normals}},
+         {"depthImg", tov_image{depth}}});
 }
 
 TEST_F(Oclgrind, Antialiasing) {
