@@ -28,7 +28,8 @@ struct Options {
 
 constexpr char kUsage[] =
     "usage: tov_bench [--device=gpu|cpu[:INDEX]] [--benchmark_filter=REGEX] [--benchmark_out=FILE.json] ...\n"
-    "Without a device: the first GPU, else the first CPU. Groups: throughput/, arithmetic/, startup/, creation/, host/.\n";
+    "Without a device: the first GPU, else the first CPU. Groups: throughput/, arithmetic/, startup/, creation/, "
+    "host/.\n";
 
 Options parse(int count, char** texts) {
     Options options;

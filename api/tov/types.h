@@ -92,27 +92,27 @@ typedef struct tov_image_desc {
 /* ---- Filters ---------------------------------------------------------------------------------------------------- */
 
 /** Filter types. The parameters of each are listed by tovParameterGetInfo and in docs/filters.md. */
-#define TOV_IMAGE_FILTER_MATH_TEST 0u             /**< Self-test of device arithmetic on five floats. */
-#define TOV_IMAGE_FILTER_COLOR_SPACE 1u           /**< Linear conversion between RGB colour spaces. */
-#define TOV_IMAGE_FILTER_NORMALIZATION 2u         /**< Divide by alpha. */
-#define TOV_IMAGE_FILTER_GAMMA_CORRECTION 3u      /**< Raise RGB to 1 / cGamma. */
-#define TOV_IMAGE_FILTER_RESAMPLE 4u              /**< Scale by box average, bilinear or bicubic interpolation. */
-#define TOV_IMAGE_FILTER_GAUSSIAN_BLUR 5u         /**< Separable Gaussian blur. */
-#define TOV_IMAGE_FILTER_SIMPLE_TONEMAP 6u        /**< Exposure, contrast and a filmic curve. */
-#define TOV_IMAGE_FILTER_REINHARD_TONEMAP 7u      /**< Reinhard et al. 2002, global operator. */
-#define TOV_IMAGE_FILTER_EXPONENTIAL_TONEMAP 8u   /**< 1 - exp(-exposure * x). */
-#define TOV_IMAGE_FILTER_LINEAR_TONEMAP 9u        /**< Multiply RGB by cKey. */
-#define TOV_IMAGE_FILTER_DRAGO_TONEMAP 10u        /**< Drago et al. 2003, adaptive logarithmic mapping. */
-#define TOV_IMAGE_FILTER_BILATERAL_DENOISE 11u    /**< Average steered by up to six auxiliary images. */
-#define TOV_IMAGE_FILTER_LWR_DENOISE 12u          /**< Local weighted regression. */
-#define TOV_IMAGE_FILTER_EAW_DENOISE 13u          /**< Edge-avoiding a-trous wavelets. */
-#define TOV_IMAGE_FILTER_SOBEL 14u                /**< Gradient magnitude of luminance. */
-#define TOV_IMAGE_FILTER_WEIGHTED_SUM 15u         /**< Weighted sum of up to six images. */
-#define TOV_IMAGE_FILTER_MULTIPLY 16u             /**< Product of up to six images. */
-#define TOV_IMAGE_FILTER_MLAA 17u                 /**< Morphological antialiasing. */
-#define TOV_IMAGE_FILTER_MOTION_BUFFER 18u        /**< Screen-space motion from world positions. */
+#define TOV_IMAGE_FILTER_MATH_TEST 0u              /**< Self-test of device arithmetic on five floats. */
+#define TOV_IMAGE_FILTER_COLOR_SPACE 1u            /**< Linear conversion between RGB colour spaces. */
+#define TOV_IMAGE_FILTER_NORMALIZATION 2u          /**< Divide by alpha. */
+#define TOV_IMAGE_FILTER_GAMMA_CORRECTION 3u       /**< Raise RGB to 1 / cGamma. */
+#define TOV_IMAGE_FILTER_RESAMPLE 4u               /**< Scale by box average, bilinear or bicubic interpolation. */
+#define TOV_IMAGE_FILTER_GAUSSIAN_BLUR 5u          /**< Separable Gaussian blur. */
+#define TOV_IMAGE_FILTER_SIMPLE_TONEMAP 6u         /**< Exposure, contrast and a filmic curve. */
+#define TOV_IMAGE_FILTER_REINHARD_TONEMAP 7u       /**< Reinhard et al. 2002, global operator. */
+#define TOV_IMAGE_FILTER_EXPONENTIAL_TONEMAP 8u    /**< 1 - exp(-exposure * x). */
+#define TOV_IMAGE_FILTER_LINEAR_TONEMAP 9u         /**< Multiply RGB by cKey. */
+#define TOV_IMAGE_FILTER_DRAGO_TONEMAP 10u         /**< Drago et al. 2003, adaptive logarithmic mapping. */
+#define TOV_IMAGE_FILTER_BILATERAL_DENOISE 11u     /**< Average steered by up to six auxiliary images. */
+#define TOV_IMAGE_FILTER_LWR_DENOISE 12u           /**< Local weighted regression. */
+#define TOV_IMAGE_FILTER_EAW_DENOISE 13u           /**< Edge-avoiding a-trous wavelets. */
+#define TOV_IMAGE_FILTER_SOBEL 14u                 /**< Gradient magnitude of luminance. */
+#define TOV_IMAGE_FILTER_WEIGHTED_SUM 15u          /**< Weighted sum of up to six images. */
+#define TOV_IMAGE_FILTER_MULTIPLY 16u              /**< Product of up to six images. */
+#define TOV_IMAGE_FILTER_MLAA 17u                  /**< Morphological antialiasing. */
+#define TOV_IMAGE_FILTER_MOTION_BUFFER 18u         /**< Screen-space motion from world positions. */
 #define TOV_IMAGE_FILTER_TEMPORAL_ACCUMULATION 19u /**< Reprojected running average of successive frames. */
-#define TOV_IMAGE_FILTER_SHADOW_CATCHER 20u       /**< Shadow matte from four packed components. */
+#define TOV_IMAGE_FILTER_SHADOW_CATCHER 20u        /**< Shadow matte from four packed components. */
 
 /**
  * Parameter types. TOV_PARAMETER_VALUE points at the value inside the filter: the 32-bit components of numeric types;
