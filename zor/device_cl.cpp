@@ -161,7 +161,7 @@ void DeviceCL::printLimits() const {
 
 void DeviceCL::waitForEvent(EventHolder& holder) {
     if (holder.event == nullptr) return;
-    const cl_event event = holder.event.get();
+    auto* const event = holder.event.get();
     check(cl().clWaitForEvents(cl_uint{1}, &event), "clWaitForEvents");
     check(cl().clReleaseEvent(holder.event.release()), "clReleaseEvent");
 }
