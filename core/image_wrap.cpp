@@ -10,7 +10,6 @@ namespace {
 template <class Value>
 std::optional<Value> memoryInfo(cl_mem memory, cl_mem_info key) {
     Value value{};
-    // NOLINTNEXTLINE(bugprone-sizeof-expression): some of the values are handles
     if (zor::cl().clGetMemObjectInfo(memory, key, sizeof value, &value, nullptr) != CL_SUCCESS) return std::nullopt;
     return value;
 }
