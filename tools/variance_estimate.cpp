@@ -12,6 +12,7 @@ namespace {
 
 constexpr size_t kComponents = 4;
 constexpr int kRadius = 3;
+constexpr size_t kWindow = size_t{kRadius} * 2 + 1;  // pixels on a side
 constexpr int kSmoothingRadius = 1;
 constexpr float kSpatialSigma = 2.0f;
 constexpr float kNormalSigma = 0.15f;
@@ -34,8 +35,8 @@ float squaredDistance(const float* a, const float* b) {
 }
 
 // Exponents of the window's Gaussian, row by row.
-std::array<float, (2 * kRadius + 1) * (2 * kRadius + 1)> spatialExponents() {
-    std::array<float, (2 * kRadius + 1) * (2 * kRadius + 1)> exponents{};
+std::array<float, kWindow * kWindow> spatialExponents() {
+    std::array<float, kWindow * kWindow> exponents{};
     for (int j = -kRadius; j <= kRadius; ++j)
         for (int i = -kRadius; i <= kRadius; ++i)
             exponents[static_cast<size_t>((j + kRadius) * (2 * kRadius + 1) + i + kRadius)] =
@@ -130,7 +131,7 @@ class Estimator {
     const NoisyPicture& picture_;
     int width_;
     int height_;
-    std::array<float, (2 * kRadius + 1) * (2 * kRadius + 1)> exponents_;
+    std::array<float, kWindow * kWindow> exponents_;
 };
 
 // Means over small boxes, weighted with the fourth component, which becomes 0.

@@ -37,6 +37,9 @@ TEST(Output, AFailureLeavesTheOldFileAndNothingElse) {
 
 TEST(Output, AFullDiskLeavesTheOldFileAndNothingElse) {
     const TemporaryDirectory directory;
+    // A driver that compiled now would meet the limit, too, and some end the process then.
+    const TemporaryDirectory before;
+    ASSERT_EQ(develop(kRender, before / "out.tif", "linear_tonemap").status, 0);
     writeFile(directory / "out.tif", "precious");
     const Setting smallFiles{.prepare = [] {
         const rlimit limit{65536, 65536};
