@@ -39,7 +39,7 @@ std::array<float, kWindow * kWindow> spatialExponents() {
     std::array<float, kWindow * kWindow> exponents{};
     for (int j = -kRadius; j <= kRadius; ++j)
         for (int i = -kRadius; i <= kRadius; ++i)
-            exponents[static_cast<size_t>((j + kRadius) * (2 * kRadius + 1) + i + kRadius)] =
+            exponents[static_cast<size_t>(j + kRadius) * kWindow + static_cast<size_t>(i + kRadius)] =
                 static_cast<float>(i * i + j * j) / (2.0f * kSpatialSigma * kSpatialSigma);
     return exponents;
 }
@@ -66,7 +66,8 @@ class Estimator {
         for (int v = std::max(y - kRadius, 0); v <= std::min(y + kRadius, height_ - 1); ++v) {
             for (int u = std::max(x - kRadius, 0); u <= std::min(x + kRadius, width_ - 1); ++u) {
                 const size_t at = index(u, v);
-                const size_t place = static_cast<size_t>((v - y + kRadius) * (2 * kRadius + 1) + u - x + kRadius);
+                const size_t place =
+                    static_cast<size_t>(v - y + kRadius) * kWindow + static_cast<size_t>(u - x + kRadius);
                 const float weight = std::exp(-(exponents_[place] + unlikeness(centre, at, place, slope)));
                 if (!(weight >= kLeastWeight) || !finite(&picture_.color[at])) continue;
                 for (size_t i = 0; i < 3; ++i) {
