@@ -230,5 +230,32 @@ TEST_F(HostMemory, OfPartsOfOneBufferIsKnownToOverlap) {
     EXPECT_EQ(maxDifference(read(output, picture), run(TOV_IMAGE_FILTER_SOBEL, picture)), 0);
 }
 
+TEST_F(HostMemory, WrappedTwiceIsOneMemory) {
+    const Picture bytes = noise(16, 8, {3, TOV_COMPONENT_TYPE_UINT8});  // whose pixels the wider output overtakes
+    const Picture floats(16, 8);
+    const cl_mem memory = buffer(floats.values.size() * sizeof(float));
+    const Handle narrow = wrapped(memory, bytes.desc(), false);
+    const Handle wide = wrapped(memory, floats.desc(), false);
+    const std::vector<std::byte> pixels = bytes.encoded();
+    ASSERT_EQ(CL(clEnqueueWriteBuffer)(queue_, memory, CL_TRUE, 0, pixels.size(), pixels.data(), 0, nullptr, nullptr),
+              CL_SUCCESS);
+    ASSERT_EQ(executeHere(TOV_IMAGE_FILTER_LINEAR_TONEMAP, {}, narrow, wide), TOV_SUCCESS);
+    EXPECT_EQ(maxDifference(read(wide, floats), run(TOV_IMAGE_FILTER_LINEAR_TONEMAP, bytes, {}, floats)), 0);
+    const Handle input = newImage(floats, owner_);
+    const Parameters outputs = {{"positionsImg", tov_image{input}}, {"outVarianceImg", tov_image{narrow}}};
+    EXPECT_EQ(executeHere(TOV_IMAGE_FILTER_TEMPORAL_ACCUMULATION, outputs, input, wide), TOV_ERROR_INVALID_PARAMETER);
+}
+
+TEST_F(HostMemory, BelongsToADeviceThatIsReportedByItsOwnName) {
+    uint32_t type = 77;
+    std::array<char, 128> name{};
+    std::array<char, 128> vendor{};
+    ASSERT_EQ(tovContextGetDeviceInfo(owner_, &type, name.data(), 0, vendor.data()), TOV_SUCCESS);
+    EXPECT_EQ(type, TOV_DEVICE_TYPE_GPU) << "what an adopted device counts as";
+    const std::array<char, 128> adopted = name;
+    ASSERT_EQ(tovContextGetDeviceInfo(context(), &type, name.data(), 0, vendor.data()), TOV_SUCCESS);
+    EXPECT_STREQ(name.data(), adopted.data());
+}
+
 }  // namespace
 }  // namespace apitest
