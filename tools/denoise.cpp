@@ -11,6 +11,7 @@
 #include "auxiliary_images.h"
 #include "denoise_defaults.h"
 #include "failure.h"
+#include "picture_channels.h"
 #include "picture_reader.h"
 #include "pipeline.h"
 #include "text.h"
@@ -22,8 +23,7 @@ namespace {
 
 using Names = std::span<const std::string_view>;
 
-// What common renderers call their layers, the best suited first.
-constexpr std::array<std::string_view, 4> kColorLayers = {"Noisy Image", "Combined", "beauty", "rgba"};
+// What common renderers call their other layers, the best suited first.
 constexpr std::array<std::string_view, 4> kAlbedoLayers = {"Denoising Albedo", "Albedo", "DiffCol", "diffuse_albedo"};
 constexpr std::array<std::string_view, 4> kNormalLayers = {"Denoising Normal", "Normal", "Normals", "N"};
 constexpr std::array<std::string_view, 3> kDepthLayers = {"Depth", "Z", "Denoising Depth"};
@@ -156,7 +156,7 @@ std::vector<float> takeAlpha(Picture& picture) {
 }  // namespace
 
 DenoiseInputs readDenoiseInputs(const std::string& input, const DenoiseOptions& options) {
-    DenoiseInputs inputs{.color = readFileOrLayer(input, kColorLayers)};
+    DenoiseInputs inputs{.color = readFileOrLayer(input, kBeautyLayers)};
     const PixelSize size = sizeOf(inputs.color);
     std::string found;
     inputs.albedo = readFeature(options.albedo, input, size, kAlbedoLayers, found);

@@ -22,6 +22,36 @@ ChannelName splitName(const std::string& channel) {
     return {channel.substr(0, dot), channel.substr(dot + 1)};
 }
 
+char lower(char c) {
+    return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
+}
+
+struct NameTest {
+    bool anyCase;
+    bool ending;  // after a dot
+
+    bool operator()(std::string_view name, std::string_view wanted) const {
+        const auto same = [this](char a, char b) { return anyCase ? lower(a) == lower(b) : a == b; };
+        if (ending && name.size() > wanted.size()) {
+            name.remove_prefix(name.size() - wanted.size() - 1);
+            if (name.front() != '.') return false;
+            name.remove_prefix(1);
+        }
+        return std::ranges::equal(name, wanted, same);
+    }
+};
+
+// From the strictest to the most forgiving.
+constexpr std::array kNameTests = {NameTest{false, false}, NameTest{false, true}, NameTest{true, false},
+                                   NameTest{true, true}};
+
+// 0 for the layer without a name, then the beauty layers in their order, then all others alike.
+size_t rank(const std::string& layer) {
+    if (layer.empty()) return 0;
+    const auto isLayer = [&](std::string_view name) { return NameTest{true, true}(layer, name); };
+    return 1 + static_cast<size_t>(std::ranges::find_if(kBeautyLayers, isLayer) - kBeautyLayers.begin());
+}
+
 class Layers {
  public:
     explicit Layers(const std::vector<std::string>& channels) {
@@ -30,6 +60,7 @@ class Layers {
             const std::string& layer = channels_.back().layer;
             if (std::ranges::find(layers_, layer) == layers_.end()) layers_.push_back(layer);
         }
+        std::ranges::stable_sort(layers_, {}, rank);
     }
 
     // The first layer that has all of the wanted names and none of the unwanted, with alpha if it has one.
@@ -78,31 +109,8 @@ class Layers {
     }
 
     std::vector<ChannelName> channels_;
-    std::vector<std::string> layers_;
+    std::vector<std::string> layers_;  // the likeliest to be the picture itself first
 };
-
-char lower(char c) {
-    return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
-}
-
-struct NameTest {
-    bool anyCase;
-    bool ending;  // after a dot
-
-    bool operator()(std::string_view name, std::string_view wanted) const {
-        const auto same = [this](char a, char b) { return anyCase ? lower(a) == lower(b) : a == b; };
-        if (ending && name.size() > wanted.size()) {
-            name.remove_prefix(name.size() - wanted.size() - 1);
-            if (name.front() != '.') return false;
-            name.remove_prefix(1);
-        }
-        return std::ranges::equal(name, wanted, same);
-    }
-};
-
-// From the strictest to the most forgiving.
-constexpr std::array kNameTests = {NameTest{false, false}, NameTest{false, true}, NameTest{true, false},
-                                   NameTest{true, true}};
 
 }  // namespace
 

@@ -2,19 +2,24 @@
 #ifndef TOV_TOOLS_PICTURE_CHANNELS_H
 #define TOV_TOOLS_PICTURE_CHANNELS_H
 
+#include <array>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <vector>
 
 namespace tool {
+
+// What common renderers call the layer of the picture itself, in any letter case; the noisier first.
+inline constexpr std::array<std::string_view, 4> kBeautyLayers = {"Noisy Image", "Combined", "beauty", "rgba"};
 
 struct ChannelChoice {
     std::vector<int> indices;        // in the file: gray, gray and alpha, RGB or RGBA
     std::vector<std::string> names;  // without their layer
 };
 
-// The first layer with R, G and B (and A); else one with luminance; else a lone channel, or X, Y and Z. None when the
-// names do not say how the channels make a picture.
+// The layer with R, G and B (and A) that has no name, else one of kBeautyLayers, else the first; else one with
+// luminance; else a lone channel, or X, Y and Z. None when the names do not say how the channels make a picture.
 std::optional<ChannelChoice> chooseChannels(const std::vector<std::string>& fileChannels);
 
 // The layers in the order of the file: what stands before the last dot of a channel's name, else the name itself.

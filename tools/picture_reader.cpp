@@ -164,11 +164,21 @@ LayerPlace findLayerIn(OIIO::ImageInput& input, const std::string& layer, std::v
     return {};
 }
 
+// Of a file whose first picture has a name like all others, as the parts of an OpenEXR file have, the beauty layer.
+std::optional<std::string> beautyPart(OIIO::ImageInput& input, const std::string& path) {
+    if (!input.seek_subimage(1, 0) || input.spec(0).get_string_attribute("oiio:subimagename").empty()) return {};
+    return firstLayer(path, kBeautyLayers);
+}
+
 }  // namespace
 
 Picture readPicture(const std::string& path) {
     const auto input = open(path);
-    const OIIO::ImageSpec spec = input->spec();
+    if (const auto layer = beautyPart(*input, path)) {
+        note(path + ": of its layers, " + *layer + " is used");
+        return readLayer(path, *layer);
+    }
+    const OIIO::ImageSpec spec = input->spec(0);
     refuseWhatIsNoPicture(path, spec);
     Picture picture = readChannels(*input, 0, path, channelsOf(path, spec));
     if (input->seek_subimage(1, 0)) note(path + ": only the first of its pictures is used");

@@ -76,6 +76,38 @@ TEST(Input, TheFirstColourLayerOfManyIsUsed) {
     }
 }
 
+TEST(Input, TheLayerWithoutANameThenTheBeautyLayerComesBeforeTheFirst) {
+    const auto chosen = [](const std::vector<std::string>& layers) {
+        std::vector<std::string> channels;
+        for (const std::string& layer : layers) {
+            for (const char* name : {"R", "G", "B"}) channels.push_back(layer + name);
+        }
+        return tool::chooseChannels(channels)->indices.front() / 3;
+    };
+    EXPECT_EQ(chosen({"V.Albedo.", "V.Combined.", "V.RGBA.", ""}), 3);
+    EXPECT_EQ(chosen({"V.Albedo.", "V.RGBA.", "V.Combined."}), 2);
+    EXPECT_EQ(chosen({"Albedo.", "NotTheBeauty.", "Beauty."}), 2);
+    EXPECT_EQ(chosen({"Albedo.", "Diffuse."}), 0);
+}
+
+TEST(Input, TheBeautyPartOfSeveralIsUsedAndTold) {
+    const TemporaryDirectory directory;
+    const std::string path = directory / "parts.exr";
+    std::vector<OIIO::ImageSpec> parts(2, OIIO::ImageSpec(2, 1, 3, OIIO::TypeDesc::FLOAT));
+    parts[0].attribute("oiio:subimagename", "Albedo");
+    parts[1].attribute("oiio:subimagename", "Combined");
+    const auto output = OIIO::ImageOutput::create(path);
+    ASSERT_TRUE(output->open(path, 2, parts.data()));
+    const std::vector<float> albedo(6, 0.25f);
+    const std::vector<float> combined(6, 0.5f);
+    ASSERT_TRUE(output->write_image(OIIO::TypeDesc::FLOAT, albedo.data()));
+    ASSERT_TRUE(output->open(path, parts[1], OIIO::ImageOutput::AppendSubimage));
+    ASSERT_TRUE(output->write_image(OIIO::TypeDesc::FLOAT, combined.data()));
+    ASSERT_TRUE(output->close());
+    EXPECT_THAT(copy(path, directory / "out.exr").err, HasSubstr("of its layers, Combined is used"));
+    EXPECT_EQ(load(directory / "out.exr").values, combined);
+}
+
 TEST(Input, ChannelNamesDecideWhatAPictureIsMadeOf) {
     using Names = std::vector<std::string>;
     const struct {
