@@ -26,18 +26,13 @@ void requireElements(void* const* images, uint32_t count) {
     }
 }
 
-// The filters that a filter reads directly and that are still alive.
+// The filters that a filter reads directly and that are still alive. Callers may have freed their arrays since the last
+// run, so what they held when they were set counts; a run looks for circles once more.
 std::vector<const TovImageFilter*> directInputs(const TovImageFilter& filter) {
     std::vector<const TovImageFilter*> inputs;
-    for (const TovFilterParameter* parameter : filter.imageParameters()) {
-        for (uint32_t i = 0; i < parameter->imageCount(); ++i) {
-            try {
-                if (const TovImageFilter* input = parameter->boundFilter(i)) inputs.push_back(input);
-            } catch (const TovException&) {
-                // Deleted: it feeds nothing any more. Running the filter reports it.
-            }
-        }
-    }
+    for (const TovFilterParameter* parameter : filter.imageParameters())
+        for (uint32_t i = 0; i < parameter->imageCount(); ++i)
+            if (const auto* input = as<TovImageFilter>(parameter->objectWhenSet(i))) inputs.push_back(input);
     return inputs;
 }
 
@@ -123,21 +118,22 @@ bool TovImageFilter::isFedBy(const TovImageFilter& filter) const {
     return false;
 }
 
+void TovImageFilter::requireNoCircle(const TovImageFilter& input) const {
+    if (input.isFedBy(*this)) refuse(TOV_ERROR_INVALID_PARAMETER, "A filter cannot be its own input");
+}
+
 void TovImageFilter::setFilterAsImage(std::string_view name, TovImageFilter& filter) {
     if (name == "dstBuffer") throw TovException{TOV_ERROR_INVALID_PARAMETER};
     TovFilterParameter& parameter = name == "srcBuffer" ? srcBuffer_ : byName(name);
-    if (filter.isFedBy(*this)) refuse(TOV_ERROR_INVALID_PARAMETER, "A filter cannot be its own input");
+    if (parameter.isImageLike()) requireNoCircle(filter);
     parameter.setImage(&filter);
 }
 
 void TovImageFilter::setImageArray(std::string_view name, void* const* images, uint32_t count) {
     requireElements(images, count);
     TovFilterParameter& parameter = byName(name);
-    for (uint32_t i = 0; i < count; ++i) {
-        const auto* filter = as<TovImageFilter>(registry::lookUp(images[i]));
-        if (filter != nullptr && filter->isFedBy(*this))
-            refuse(TOV_ERROR_INVALID_PARAMETER, "A filter cannot be its own input");
-    }
+    for (uint32_t i = 0; parameter.isImageLike() && i < count; ++i)
+        if (const auto* filter = as<TovImageFilter>(registry::lookUp(images[i]))) requireNoCircle(*filter);
     parameter.setImageArray(images, count);
 }
 

@@ -79,6 +79,7 @@ class TovImageFilter final : public TovObject {
  private:
     TovFilterParameter& byName(std::string_view name);
     bool isFedBy(const TovImageFilter& filter) const;
+    void requireNoCircle(const TovImageFilter& input) const;
     void reserveState();
 
     DevicePointer device_;

@@ -120,6 +120,10 @@ TovImageFilter* TovFilterParameter::boundFilter(uint32_t element) const {
     return as<TovImageFilter>(boundObject(element));
 }
 
+TovObject* TovFilterParameter::objectWhenSet(uint32_t element) const noexcept {
+    return element < bound_.size() ? bound_[element].get() : nullptr;
+}
+
 void TovFilterParameter::setStandIn(uint32_t element, const zor::BufferBase* memory) {
     if (standIns_.size() <= element) standIns_.resize(element + 1, nullptr);
     standIns_[element] = memory;

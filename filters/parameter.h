@@ -61,10 +61,13 @@ class TovFilterParameter {
     }
     // Elements that an image or image-array parameter binds; 0 for the other types.
     uint32_t imageCount() const noexcept { return isImageLike() ? count_ : 0; }
-    // The live object bound to an element, null for an absent one. A deleted one throws its handle's code.
+    // The live object bound to an element, null for an absent one. A deleted one throws its handle's code. Reads the
+    // caller's array, so only while the filter runs.
     TovObject* boundObject(uint32_t element = 0) const;
     TovImage* boundImage(uint32_t element = 0) const;         // null also for a filter
     TovImageFilter* boundFilter(uint32_t element = 0) const;  // null also for an image
+    // What an element was when it was set; null for an absent and for a deleted one. Does not read the caller's array.
+    TovObject* objectWhenSet(uint32_t element) const noexcept;
 
     // Memory that stands in for a bound image while the filter runs; null for the image's own. kReadBackElement of an
     // output is what passes write for a later pass to read.
