@@ -78,6 +78,7 @@ void TovImage::upload(const void* data) {
 bool TovImage::sharesMemoryWith(const TovImage& other) const noexcept {
     const Placement& a = placement_;
     const Placement& b = other.placement_;
+    if (a.textureLevel[0] != 0 && a.textureLevel == b.textureLevel) return true;
     if (a.root == nullptr || a.root != b.root) return false;
     return a.offset < b.offset + b.size && b.offset < a.offset + a.size;
 }

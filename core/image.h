@@ -1,6 +1,7 @@
 // An image: a descriptor and a linear device buffer, or memory that the caller owns.
 #pragma once
 
+#include <array>
 #include <cstdint>
 #include <memory>
 #include <vector>
@@ -70,11 +71,12 @@ class TovImage final : public TovObject {
     void unmap(void* pointer);
 
  private:
-    // Where a caller's memory object lies: sub-buffers of one buffer share its memory.
+    // Where the memory lies: sub-buffers of one buffer share its memory, and all wraps of one texture level theirs.
     struct Placement {
         cl_mem root = nullptr;
-        uint64_t offset = 0;  // bytes
-        uint64_t size = 0;    // bytes
+        uint64_t offset = 0;                        // bytes
+        uint64_t size = 0;                          // bytes
+        std::array<uint32_t, 3> textureLevel = {};  // name, target, level; name 0: no texture
     };
 
     void placeBuffer(cl_mem memory, uint64_t size);

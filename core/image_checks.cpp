@@ -86,9 +86,11 @@ void requireSize(const Binding& binding) {
                              (rule == SizeRule::EqualOutput ? ": this filter needs equal sizes" : ""));
 }
 
-bool sameLayout(const TovImage& a, const TovImage& b) {
-    return a.storage()->memory() == b.storage()->memory() && a.width() == b.width() && a.desc().type == b.desc().type &&
-           a.desc().num_components == b.desc().num_components && a.isOpenClImage() == b.isOpenClImage();
+// Buffers in which every pixel lies at the same place. No kernel may both read and write one OpenCL image object.
+bool samePixels(const TovImage& a, const TovImage& b) {
+    return !a.isOpenClImage() && !b.isOpenClImage() && a.storage()->memory() == b.storage()->memory() &&
+           a.width() == b.width() && a.desc().type == b.desc().type &&
+           a.desc().num_components == b.desc().num_components;
 }
 
 }  // namespace
@@ -129,7 +131,7 @@ std::vector<AliasedInput> aliasedInputs(const FilterTree& tree) {
         if (input.isOutput) continue;
         for (const Binding& output : bindings) {
             if (!output.isOutput || !input.image->sharesMemoryWith(*output.image)) continue;
-            if (!input.node->readsAround && sameLayout(*input.image, *output.image)) continue;
+            if (!input.node->readsAround && samePixels(*input.image, *output.image)) continue;
             aliased.push_back({input.parameter, input.element, input.image});
             break;
         }

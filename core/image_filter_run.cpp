@@ -47,6 +47,16 @@ class AcquiredTextures {
     std::vector<cl_mem> memories_;
 };
 
+// Everything that the filters inside a fused kernel read; what would be their outputs has a size of its own.
+void acquireInnerInputs(AcquiredTextures& textures, const FilterTree& tree) {
+    for (const FilterNode& node : tree.nodes()) {
+        if (node.filter == tree.nodes().front().filter) continue;
+        for (const TovFilterParameter* parameter : node.filter->imageParameters())
+            for (uint32_t i = 0; !parameter->runSize() && i < parameter->imageCount(); ++i)
+                textures.acquire(parameter->boundImage(i));
+    }
+}
+
 // Copies that stand in for inputs during a run.
 class StandIns {
  public:
@@ -86,7 +96,8 @@ void TovImageFilter::apply() {
     checkImages(tree);
 
     AcquiredTextures textures(*device_);
-    for (const FilterNode& node : tree.nodes()) textures.acquire(node.filter->srcBuffer_.boundImage());
+    textures.acquire(srcBuffer_.boundImage());
+    acquireInnerInputs(textures, tree);
     textures.acquire(dstBuffer_.boundImage());
     owner.reserveScratch(spec_.scratchBytesPerPixel * pixelsOf(srcBuffer_));
     reserveState();

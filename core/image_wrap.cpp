@@ -88,13 +88,14 @@ void TovImage::wrapOpenClMemory(cl_mem memory, bool isImage) {
 
 void TovImage::wrapOpenGlTexture(uint32_t target, int32_t level, uint32_t texture) {
     storage_.reset();
+    if (!device_->isInitialized()) refuse(TOV_ERROR_INTERNAL_ERROR, "The context has no OpenCL device");
     cl_int status = CL_SUCCESS;
     zor::MemoryHandle memory(
         zor::cl().clCreateFromGLTexture(device_->getContext(), CL_MEM_READ_WRITE, target, level, texture, &status));
     zor::check(status, "clCreateFromGLTexture");
     const uint64_t size = requireSize(memory.get());
     storage_ = std::make_unique<zor::Buffer<char>>(*device_, size, zor::BUFFER_NO_ALLOCATION);
-    placement_ = {memory.get(), 0, size};
+    placement_ = {memory.get(), 0, size, {texture, target, static_cast<uint32_t>(level)}};
     storage_->adopt(memory.release(), size, true);
     external_ = true;
     externalKind_ = EXTERNAL_KIND_TEXTURE;

@@ -60,7 +60,7 @@ struct ValueRule {
 
 // How a run whose output is also an input must be treated.
 enum class InPlace {
-    PerPixel,     // each pixel is read before it is written, by the same item: safe where the layouts agree
+    PerPixel,     // each pixel is read before it is written, by the same item: safe in a buffer where the layouts agree
     PrivateCopy,  // reads more than its own pixel, or after its first write
 };
 

@@ -150,12 +150,29 @@ TEST_F(Textures, InputAndOutputAreAcquiredAroundARunAndOtherImagesAreNot) {
     EXPECT_EQ(acquired(), 2u) << "only input and output are";
 }
 
-TEST_F(Textures, OneTextureAsInputAndOutputIsAcquiredAndReleasedTwice) {
-    const tov_image image = wrapped();
-    const int32_t code = run(TOV_IMAGE_FILTER_LINEAR_TONEMAP, image, image);
-    EXPECT_TRUE(code == TOV_SUCCESS || code == TOV_ERROR_UNSUPPORTED) << code;
-    EXPECT_EQ(acquired(), 2u);
-    EXPECT_EQ(released(), 2u);
+TEST_F(Textures, OneTextureAsInputAndOutputIsAcquiredAndReleasedTwiceAndReadFromACopy) {
+    const tov_image image = wrapped(5);
+    const tov_image again = wrapped(5);
+    for (const tov_image output : {image, again}) {
+        driver().calls.clear();
+        EXPECT_EQ(run(TOV_IMAGE_FILTER_LINEAR_TONEMAP, image, output), TOV_SUCCESS);
+        EXPECT_EQ(acquired(), 2u);
+        EXPECT_EQ(released(), 2u);
+        EXPECT_EQ(driver().callCount("clEnqueueCopyImage"), 1u) << "no kernel may read and write one image";
+    }
+}
+
+TEST_F(Textures, WhatFiltersInsideAFusedKernelReadIsAcquired) {
+    tov_image inputs[] = {wrapped(6)};
+    tov_image_filter inner = nullptr;
+    ASSERT_EQ(tovContextCreateImageFilter(context_, TOV_IMAGE_FILTER_MULTIPLY, &inner), TOV_SUCCESS);
+    objects_.push_back(inner);
+    ASSERT_EQ(tovImageFilterSetParameterImage(inner, "srcBuffer", wrapped(5)), TOV_SUCCESS);
+    ASSERT_EQ(tovImageFilterSetParameterImageArray(inner, "inputs", &inputs[0], 1), TOV_SUCCESS);
+    ASSERT_EQ(tovImageFilterSetParameter1u(inner, "inputsNum", 1), TOV_SUCCESS);
+    ASSERT_EQ(run(TOV_IMAGE_FILTER_LINEAR_TONEMAP, inner, wrapped(7)), TOV_SUCCESS);
+    EXPECT_EQ(acquired(), 3u);
+    EXPECT_EQ(released(), 3u);
 }
 
 TEST_F(Textures, WhatWasAcquiredIsReleasedWhenTheRunFails) {
