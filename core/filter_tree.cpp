@@ -14,6 +14,10 @@ constexpr Size kNoSize = {0, 0};
     refuse(TOV_ERROR_UNSUPPORTED, "Cannot fuse filters: " + why);
 }
 
+[[noreturn]] void refuseTooMany() {
+    refuseFusion("the tree has more than " + std::to_string(FilterTree::kMaxPasses) + " passes");
+}
+
 bool isScaling(const TovImageFilter& filter) {
     return filter.spec().sizeRule == SizeRule::AnyInput;
 }
@@ -33,6 +37,7 @@ class PathStep {
     PathStep(std::vector<const TovImageFilter*>& path, const TovImageFilter& filter) : path_(path) {
         if (std::find(path.begin(), path.end(), &filter) != path.end())
             refuseFusion(filter.kernelName() + " feeds itself");
+        if (path.size() == FilterTree::kMaxPasses) refuseTooMany();
         path_.push_back(&filter);
     }
     PathStep(const PathStep&) = delete;
@@ -67,7 +72,7 @@ void FilterTree::clearSizes() noexcept {
 
 void FilterTree::visit(TovImageFilter& filter, const Size& outputSize, bool readsAround) {
     const PathStep step(path_, filter);
-    if (nodes_.size() == kMaxPasses) refuseFusion("the tree has more than " + std::to_string(kMaxPasses) + " passes");
+    if (nodes_.size() == kMaxPasses) refuseTooMany();
     nodes_.push_back({&filter, outputSize, readsAround || filter.spec().inPlace != InPlace::PerPixel});
     const bool inner = nodes_.size() > 1;
     if (inner) {
