@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <array>
-#include <filesystem>
 #include <limits>
 #include <span>
 
@@ -10,6 +9,7 @@
 #include "kernelgen/fusion.h"
 #include "kernelgen/option_text.h"
 #include "kernelgen/sources.h"
+#include "zor/file_time.h"
 #include "zor/kernel_builder.h"
 
 namespace {
@@ -103,7 +103,7 @@ zor::Kernel* TovFilterPass::findFusedKernel(TovImageFilter& root) const {
     const std::array<std::string_view, 1> included = {text};
     const std::array<std::string_view, 2> embedded = {commonKernelSource(),
                                                       std::string_view(text).substr(kIncludeCommon.size())};
-    const bool isOnDisk = std::filesystem::exists(common);
+    const bool isOnDisk = zor::fileExists(common);
     return context_.device()->getKernel({.fileName = directory + "Combined",
                                          .kernelName = kernelName_,
                                          .options = options,
