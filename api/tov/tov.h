@@ -198,9 +198,10 @@ TOV_API int32_t tovContextCreateImageFilter(tov_context context, uint32_t filter
  * tovImageFilterSetParameter2u also takes "srcRec" and "dstRec": width and height, in pixels, of the part of the
  * input and output that the filter works on, until the next binding.
  *
- * @return TOV_ERROR_INVALID_FILTER; TOV_ERROR_INVALID_PARAMETER_NAME: name is null or unknown; TOV_ERROR_UNSUPPORTED:
- *         the parameter has another type; TOV_ERROR_INVALID_PARAMETER: matrix, or values or images with a non-zero
- *         count, is null, or an array element is neither null nor a live image or filter.
+ * @return TOV_ERROR_INVALID_FILTER; TOV_ERROR_INVALID_PARAMETER_NAME: name is null; TOV_ERROR_INVALID_PARAMETER:
+ * matrix, or values or images with a non-zero count, is null, an image array has more than 64 elements, or one of them
+ *         is neither null nor a live image or filter; TOV_ERROR_INVALID_PARAMETER_NAME: the filter has no such
+ *         parameter; TOV_ERROR_UNSUPPORTED: the parameter has another type.
  */
 TOV_API int32_t tovImageFilterSetParameter1u(tov_image_filter filter, const char* name, uint32_t x);
 TOV_API int32_t tovImageFilterSetParameter2u(tov_image_filter filter, const char* name, uint32_t x, uint32_t y);
