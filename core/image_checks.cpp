@@ -77,13 +77,14 @@ void requireSize(const Binding& binding) {
     const Size& output = binding.node->outputSize;
     const TovImage& image = *binding.image;
     if (rule == SizeRule::Unchecked) return;
-    if (rule == SizeRule::AnyInput && std::string_view(binding.parameter->name()) == "srcBuffer") return;
+    const bool isInput = std::string_view(binding.parameter->name()) == "srcBuffer";
+    if (rule == SizeRule::AnyInput && isInput) return;
+    const bool mustEqual = rule == SizeRule::EqualOutput || (rule == SizeRule::EqualInput && isInput);
     const bool covers = image.width() >= output[0] && image.height() >= output[1];
     const bool equals = image.width() == output[0] && image.height() == output[1];
-    if (rule == SizeRule::EqualOutput ? equals : covers) return;
+    if (mustEqual ? equals : covers) return;
     refuseImage(binding, "has " + sizeText(image.width(), image.height()) + " pixels, the output " +
-                             sizeText(output[0], output[1]) +
-                             (rule == SizeRule::EqualOutput ? ": this filter needs equal sizes" : ""));
+                             sizeText(output[0], output[1]) + (mustEqual ? ": this filter needs equal sizes" : ""));
 }
 
 // Buffers in which every pixel lies at the same place. No kernel may both read and write one OpenCL image object.

@@ -243,7 +243,7 @@ std::array<FilterSpec, kFilterTypes> makeCatalogue() {
         {.type = TOV_IMAGE_FILTER_EAW_DENOISE,
          .description = "Edge avoided `A-Trous wavelet denoiser.",
          .scratchBytesPerPixel = 24,  // a four-float colour image, then a two-float variance pair per pixel
-         .sizeRule = SizeRule::EqualOutput,
+         .sizeRule = SizeRule::EqualInput,
          .parameters = {imageParameter("normalsImg", kWaveletNormalsText),
                         imageParameter("depthImg", kWaveletNormalsText), imageParameter("transImg", kTransitionText),
                         imageParameter("colorVar", kWaveletNormalsText),
@@ -284,7 +284,7 @@ std::array<FilterSpec, kFilterTypes> makeCatalogue() {
          .scratchBytesPerPixel = 32,  // four-float edges, then four-float weights
          .hasState = true,
          .stateContents = areaTable,
-         .sizeRule = SizeRule::EqualOutput,
+         .sizeRule = SizeRule::EqualInput,
          .parameters = {imageParameter("meshIDImg", kAntialiasingMeshText),
                         imageParameter("normalsImg", kAntialiasingNormalsText),
                         imageParameter("depthImg", kAntialiasingDepthText),

@@ -67,7 +67,8 @@ enum class InPlace {
 // Which sizes the images may have, in pixels.
 enum class SizeRule {
     CoverOutput,  // every input is at least as large as the output
-    EqualOutput,  // every input has exactly the output's size: kernels also index by the input's
+    EqualInput,   // srcBuffer has exactly the output's size: kernels also index by it; the others cover the output
+    EqualOutput,  // every input has exactly the output's size
     AnyInput,     // srcBuffer has any size, the others cover the output
     Unchecked,    // the filter's own check decides
 };

@@ -210,5 +210,19 @@ TEST_F(ExecutionChecks, TwoOutputsOnOneImageAreRefused) {
     EXPECT_EQ(attempt(TOV_IMAGE_FILTER_TEMPORAL_ACCUMULATION, parameters).code, TOV_ERROR_INVALID_PARAMETER);
 }
 
+using LargerAuxiliaryImages = DeviceTest;
+
+TEST_F(LargerAuxiliaryImages, AreReadAtTheCoordinatesOfTheOutput) {
+    const auto halves = [](uint32_t x, uint32_t) { return x < 8 ? Rgba{1, 0, 0, 1} : Rgba{0, 1, 0, 1}; };
+    const Handle fitting = newImage(painted(16, 9, kFloat4, halves));
+    const Handle larger = newImage(painted(21, 13, kFloat4, halves));
+    const Picture input = noise(16, 9);
+    for (const uint32_t type : {TOV_IMAGE_FILTER_EAW_DENOISE, TOV_IMAGE_FILTER_LWR_DENOISE, TOV_IMAGE_FILTER_MLAA})
+        EXPECT_EQ(maxDifference(run(type, input, {{"normalsImg", tov_image{larger}}}),
+                                run(type, input, {{"normalsImg", tov_image{fitting}}})),
+                  0.0)
+            << type;
+}
+
 }  // namespace
 }  // namespace apitest
