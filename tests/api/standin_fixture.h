@@ -25,7 +25,6 @@ class StandinTest : public testing::Test {
     void SetUp() override {
         ASSERT_NE(standin::findState(), nullptr) << "another OpenCL library answers to the name";
         driver().reset();
-        driver().ignoreErrorLines = true;  // "Math" has one for the case of too many inputs
     }
     void TearDown() override {
         EXPECT_EQ(driver().liveObjects(), 0u);

@@ -24,11 +24,11 @@
 #include <CL/cl_gl.h>
 #include <dlfcn.h>
 
+#include <algorithm>
 #include <cstdint>
 #include <cstring>
 #include <functional>
 #include <map>
-#include <optional>
 #include <string>
 #include <vector>
 
@@ -40,7 +40,7 @@ struct Device {
     std::string vendor = "Stand-in vendor";
     std::string version = "OpenCL 1.2 stand-in";
     std::string driverVersion = "1.0";
-    std::optional<std::string> boardName{};  // answers the vendor-specific query 0x4038
+    std::string boardName{};  // answers the vendor-specific query 0x4038
     std::vector<size_t> workItemSizes{1024, 1024, 64};
     size_t workGroupSize = 1024;
     uint64_t globalMemory = uint64_t{4} << 30;   // bytes
@@ -62,8 +62,8 @@ struct Platform {
 // One call as it reached the library. What text and numbers hold is said beside each function that fills them.
 struct Call {
     std::string name;
-    std::string text;
-    std::vector<uint64_t> numbers;
+    std::string text{};
+    std::vector<uint64_t> numbers{};
 };
 
 struct Argument {
@@ -81,23 +81,18 @@ struct Argument {
 struct Launch {
     std::string kernel;
     std::string options;  // of the program
-    std::string source;
-    bool fromBinary = false;
-    std::vector<size_t> global;
-    std::vector<size_t> local;
-    std::map<uint32_t, Argument> arguments;
+    std::vector<size_t> global{}, local{};
+    std::map<uint32_t, Argument> arguments{};
 };
 
 struct State {
     // What the machine offers. Without platforms clGetPlatformIDs gives -1001.
-    std::vector<Platform> platforms;
-    bool refuseBinaries = false;    // clCreateProgramWithBinary gives CL_INVALID_BINARY
-    bool failBuilds = false;        // clBuildProgram gives CL_BUILD_PROGRAM_FAILURE; so does a source with "#error"
-    bool ignoreErrorLines = false;  // builds it all the same: the conditions around "#error" are not evaluated
-    std::string buildLog;           // of a failed build
-    bool hasGlContextInfo = true;   // clGetGLContextInfoKHR can be found
-    size_t glDevice = 0;            // the device that it names, counted over all platforms
-    uint64_t queueThread = 0;       // answers the vendor-specific queue query 0x403E
+    std::vector<Platform> platforms = {{.devices = {gpu("Stand-in GPU"), cpu("Stand-in CPU")}}};
+    std::string buildLog;                         // of every build
+    bool hasGlContextInfo = true;                 // clGetGLContextInfoKHR can be found
+    size_t glDevice = 0;                          // the device that it names, of the first platform
+    int32_t eventStatus = CL_SUBMITTED;           // of all events
+    uint64_t queueThread = 0;                     // answers the vendor-specific queue query 0x403E
     std::function<void(const Launch&)> onLaunch;  // called at each launch, may read and write bytesOf()
 
     // What happened.
@@ -111,70 +106,56 @@ struct State {
     }
 
     size_t callCount(const std::string& name) const {
-        size_t count = 0;
-        for (const Call& call : calls) count += call.name == name ? 1 : 0;
-        return count;
+        return static_cast<size_t>(std::ranges::count(calls, name, &Call::name));
     }
     // The latest call of the name; an empty one where there was none.
     Call lastCall(const std::string& name) const {
-        for (auto call = calls.rbegin(); call != calls.rend(); ++call)
-            if (call->name == name) return *call;
-        return {};
+        const auto call = std::find_if(calls.rbegin(), calls.rend(), [&](const Call& c) { return c.name == name; });
+        return call == calls.rend() ? Call{} : *call;
     }
     // Objects created and not released; of one kind: "context", "queue", "memory", "program", "kernel", "event".
     size_t liveObjects(const std::string& kind = "") const {
-        size_t count = 0;
-        for (const auto& [object, liveKind] : live) count += kind.empty() || kind == liveKind ? 1 : 0;
-        return count;
+        return static_cast<size_t>(
+            std::ranges::count_if(live, [&](const auto& object) { return kind.empty() || kind == object.second; }));
     }
 
-    // Forgets script and log and offers one platform with a GPU and a CPU. Live objects stay known.
+    // Forgets script and log. Live objects stay known.
     void reset() {
-        const std::map<const void*, std::string> kept = live;
-        const auto keptMaps = maps;
-        *this = State{};
-        live = kept;
-        maps = keptMaps;
-        platforms = {{.devices = {gpu("Stand-in GPU"), cpu("Stand-in CPU")}}};
+        State fresh;
+        fresh.live.swap(live);
+        fresh.maps.swap(maps);
+        *this = std::move(fresh);
     }
 
     // The library's own.
     struct Failure {
-        int32_t status = 0;
-        uint32_t at = 1;
-        uint32_t count = 1;
+        int32_t status;
+        uint32_t at, count;
     };
     std::map<std::string, Failure> failures;
     std::map<const void*, std::string> live;
     std::map<std::pair<const void*, const void*>, uint32_t> maps;  // memory object and pointer, not yet unmapped
 };
 
-inline void* symbol(const char* name) {
-    static void* const library = dlopen("libOpenCL.so.1", RTLD_NOW | RTLD_LOCAL);
-    return library != nullptr ? dlsym(library, name) : nullptr;
-}
-
 // A function of the library for the test's own use: function<decltype(clCreateImage)>("clCreateImage").
 template <class Function>
 Function* function(const char* name) {
-    return reinterpret_cast<Function*>(symbol(name));
+    static void* const library = dlopen("libOpenCL.so.1", RTLD_NOW | RTLD_LOCAL);
+    return reinterpret_cast<Function*>(library != nullptr ? dlsym(library, name) : nullptr);
 }
 
 // Null when another OpenCL library answers to the name.
 inline State* findState() {
-    using Get = State*();
-    auto* const get = reinterpret_cast<Get*>(symbol("standin_state"));
+    auto* const get = function<State*()>("standin_state");
     return get != nullptr ? get() : nullptr;
 }
-
 inline State& state() {
     return *findState();
 }
 
 // The bytes of a buffer, whose size is given to bytes when that is not null.
 inline unsigned char* bytesOf(cl_mem memory, size_t* bytes = nullptr) {
-    using Get = unsigned char*(cl_mem, size_t*);
-    return reinterpret_cast<Get*>(symbol("standin_bytes"))(memory, bytes);
+    return function<unsigned char*(cl_mem, size_t*)>("standin_bytes")(memory, bytes);
 }
 
 }  // namespace standin

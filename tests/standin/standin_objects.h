@@ -1,4 +1,4 @@
-// The objects behind the stand-in's handles, and what every entry point begins with.
+// The objects behind the stand-in's handles, and what every entry point begins and ends with.
 #pragma once
 
 #include "standin.h"
@@ -8,44 +8,49 @@
 #include <memory>
 
 #define STANDIN_API extern "C" __attribute__((visibility("default")))
+#define STANDIN_EVENTS cl_uint, const cl_event*, cl_event*
 
-struct _cl_platform_id {
-    size_t index;
+namespace standin {
+
+struct Kind {
+    const char* name;
+    int32_t invalid;  // status of a call with a dead handle
 };
-struct _cl_device_id {
-    size_t platform;
-    size_t index;
+
+}  // namespace standin
+
+struct Index {
+    size_t platform, index;
 };
-struct Counted {
-    uint32_t references = 1;
-};
-struct _cl_context : Counted {
+struct _cl_platform_id : Index {};
+struct _cl_device_id : Index {};
+struct _cl_context {
+    static constexpr standin::Kind kKind{"context", CL_INVALID_CONTEXT};
     cl_device_id device = nullptr;
 };
-struct _cl_command_queue : Counted {};
-struct FreeBytes {
-    void operator()(void* bytes) const noexcept { std::free(bytes); }
+struct _cl_command_queue {
+    static constexpr standin::Kind kKind{"queue", CL_INVALID_COMMAND_QUEUE};
 };
-struct _cl_mem : Counted {
+struct _cl_mem {
+    static constexpr standin::Kind kKind{"memory", CL_INVALID_MEM_OBJECT};
     cl_context context = nullptr;
-    cl_mem_object_type type = CL_MEM_OBJECT_BUFFER;
     cl_mem_flags flags = 0;
     size_t size = 0;
-    std::unique_ptr<unsigned char, FreeBytes> own;
+    std::unique_ptr<unsigned char, decltype(&std::free)> own{nullptr, std::free};
     unsigned char* bytes = nullptr;
     cl_image_format format{};
-    size_t width = 0, height = 0, depth = 0;
-    uint32_t texture = 0;
+    size_t width = 0, height = 0;  // 0: a buffer
 };
-struct _cl_program : Counted {
-    std::string source, options, log;
-    bool fromBinary = false, built = false;
+struct _cl_program {
+    static constexpr standin::Kind kKind{"program", CL_INVALID_PROGRAM};
+    std::string source, options;
 };
-struct _cl_kernel : Counted {
+struct _cl_kernel {
+    static constexpr standin::Kind kKind{"kernel", CL_INVALID_KERNEL};
     standin::Launch launch;
 };
-struct _cl_event : Counted {
-    cl_int status = CL_SUBMITTED;
+struct _cl_event {
+    static constexpr standin::Kind kKind{"event", CL_INVALID_EVENT};
 };
 
 namespace standin {
@@ -53,52 +58,55 @@ namespace standin {
 State& script();
 
 // Logs the call; the status it is scripted to fail with, else success.
-int32_t enter(const char* name, std::string text = {}, std::vector<uint64_t> numbers = {});
+int32_t begin(Call call);
+// Success for a live object of the kind; the status of a dead one, which is misuse.
+int32_t checkLive(const std::string& call, const void* object, Kind kind);
 
-void complain(const std::string& what);
-bool isLive(const void* object, const char* kind);
+// Begins an entry point: its scripted status, else that of the first dead handle, else success.
+template <class... Objects>
+int32_t enter(Call call, const Objects*... handles) {
+    const std::string name = call.name;
+    int32_t status = begin(std::move(call));
+    ((status = status != CL_SUCCESS ? status : checkLive(name, handles, Objects::kKind)), ...);
+    return status;
+}
 
+// Ends a creating call: the new object, or null and the status.
 template <class Object>
-Object* add(std::unique_ptr<Object> object, const char* kind) {
-    script().live[object.get()] = kind;
+Object* give(cl_int* out, int32_t status, std::unique_ptr<Object> object) {
+    if (out != nullptr) *out = status;
+    if (status != CL_SUCCESS) return nullptr;
+    script().live[object.get()] = Object::kKind.name;
     return object.release();
 }
 
-template <class Object>
-int32_t retain(const char* name, Object* object, const char* kind, int32_t invalid) {
-    if (const int32_t status = enter(name)) return status;
-    if (!isLive(object, kind)) return complain(name), invalid;
-    ++object->references;
-    return CL_SUCCESS;
-}
-
-template <class Object>
-int32_t release(const char* name, Object* object, const char* kind, int32_t invalid) {
-    if (const int32_t status = enter(name)) return status;
-    if (!isLive(object, kind)) return complain(name), invalid;
-    if (--object->references > 0) return CL_SUCCESS;
-    script().live.erase(object);
-    delete object;
-    return CL_SUCCESS;
-}
-
-// What a creating call gives for a failure.
-template <class Object = void>
-std::nullptr_t refuse(int32_t status, cl_int* out) {
-    if (out != nullptr) *out = status;
-    return nullptr;
-}
-template <class Object>
-Object* give(Object* object, cl_int* out) {
-    if (out != nullptr) *out = CL_SUCCESS;
-    return object;
-}
-
-int32_t answer(const void* data, size_t bytes, size_t capacity, void* out, size_t* outSize);
-int32_t answer(const std::string& text, size_t capacity, void* out, size_t* outSize);
+// The bytes that answer a query.
 template <class Value>
-int32_t answerValue(const Value& value, size_t capacity, void* out, size_t* outSize) {
-    return answer(&value, sizeof value, capacity, out, outSize);
+std::string bytesOfValue(const Value& value) {
+    return {reinterpret_cast<const char*>(&value), sizeof value};
 }
+using Answers = std::map<cl_uint, std::string>;
+int32_t answer(const Answers& answers, cl_uint key, size_t capacity, void* out, size_t* outSize);
+
+// A property list without its ending zero.
+std::vector<uint64_t> numbersOf(const cl_context_properties* properties);
 
 }  // namespace standin
+
+// Entry points that differ in name and handle alone: releases, commands without effect, queries with their answers.
+#define STANDIN_RELEASE(call, Handle)                                              \
+    STANDIN_API cl_int call(Handle object) {                                       \
+        if (const int32_t status = standin::enter({#call}, object)) return status; \
+        standin::script().live.erase(object);                                      \
+        delete object;                                                             \
+        return CL_SUCCESS;                                                         \
+    }
+#define STANDIN_COMMAND(call)                         \
+    STANDIN_API cl_int call(cl_command_queue queue) { \
+        return standin::enter({#call}, queue);        \
+    }
+#define STANDIN_QUERY(call, Handle, ...)                                                               \
+    STANDIN_API cl_int call(Handle object, cl_uint key, size_t capacity, void* out, size_t* outSize) { \
+        if (const int32_t status = standin::enter({#call}, object)) return status;                     \
+        return standin::answer(__VA_ARGS__, key, capacity, out, outSize);                              \
+    }

@@ -1,203 +1,101 @@
-// Which devices are counted, listed and chosen, and what initialisation prints and releases.
+// Which devices are counted, listed and chosen, what initialisation prints, and which contexts are made for OpenGL.
 #include "fixture.h"
 
 using standin::cpu;
 using standin::gpu;
-using testing::HasSubstr;
-using testing::Not;
 
 class Discovery : public OnStandin {
  protected:
-    std::string chosenName(uint32_t index, uint32_t mask = zor::kAllVendors) {
-        const DeviceOwner device = makeDevice({.deviceIndex = index, .vendorMask = mask});
-        return opencl(device).deviceName();
+    std::string chosen(const zor::DeviceConfig& config) { return opencl(makeDevice(config)).deviceName(); }
+    static uint32_t count(uint32_t mask = zor::kAllVendors, bool ofCpus = false) {
+        return zor::getDeviceCount(ofCpus, mask);
     }
 };
 
-TEST(ClassifyVendor, ComparesTheWholeText) {
-    EXPECT_EQ(zor::classifyVendor("NVIDIA Corporation"), zor::VENDOR_NVIDIA);
-    EXPECT_EQ(zor::classifyVendor("Quarrion, Inc."), zor::VENDOR_QUARRION);
-    EXPECT_EQ(zor::classifyVendor("Intel(R) Corporation"), zor::VENDOR_INTEL);
-    EXPECT_EQ(zor::classifyVendor("Apple"), zor::VENDOR_APPLE);
-    EXPECT_EQ(zor::classifyVendor("Apple "), zor::VENDOR_UNKNOWN);
-    EXPECT_EQ(zor::classifyVendor(""), zor::VENDOR_UNKNOWN);
-}
-
-TEST_F(Discovery, CountsTheTypeOverAllAdmittedPlatforms) {
+TEST_F(Discovery, CountsAndIndexesTheDevicesOfTheAdmittedPlatforms) {
     driver().platforms = {
-        {"Apple", {gpu("a"), cpu("b"), gpu("c")}}, {"Else", {gpu("d")}}, {"Intel(R) Corporation", {}}};
-    EXPECT_EQ(zor::getDeviceCount(false, zor::kAllVendors), 3u);
-    EXPECT_EQ(zor::getDeviceCount(true, zor::kAllVendors), 1u);
-    EXPECT_EQ(zor::getDeviceCount(false, zor::VENDOR_UNKNOWN), 1u);
-    EXPECT_EQ(zor::getDeviceCount(false, zor::VENDOR_NVIDIA), 0u);
-}
-
-TEST_F(Discovery, ASecondQuarrionPlatformIsWarnedOfAndCountsNothing) {
-    driver().platforms = {{"Quarrion, Inc.", {gpu("a")}}, {"Quarrion, Inc.", {gpu("b"), gpu("c")}}};
-    uint32_t count = 0;
-    const std::string line = printed([&] { count = zor::getDeviceCount(false, zor::kAllVendors); });
-    EXPECT_EQ(count, 1u);
-    EXPECT_EQ(line, "WARNING : the system has more than 1 QUARRION platform installed\n");
-    EXPECT_EQ(chosenName(9), "a");
-    EXPECT_THAT(lines, HasSubstr("CL: 1 device (Quarrion, Inc.)\nCL: 0 device (Quarrion, Inc.)\n"));
-}
-
-TEST_F(Discovery, InitialisationMarksAQuarrionPlatformAlsoWhenItHasNoDevice) {
-    driver().platforms = {{"Quarrion, Inc.", {cpu("x")}}, {"Quarrion, Inc.", {gpu("b")}}};
-    const DeviceOwner device = makeDevice();
-    EXPECT_FALSE(device->isInitialized());
-    EXPECT_THAT(lines, HasSubstr("CL: 0 device (Quarrion, Inc.)\nCL: 0 device (Quarrion, Inc.)\n"));
-    driver().platforms[1].vendor = "Else";
-    EXPECT_EQ(chosenName(0, ~zor::VENDOR_QUARRION), "b");
-    EXPECT_FALSE(makeDevice({.vendorMask = zor::VENDOR_QUARRION})->isInitialized());
-}
-
-TEST_F(Discovery, NoPlatformMeansNoDeviceAndNoError) {
-    driver().platforms.clear();
-    EXPECT_EQ(zor::getDeviceCount(false, zor::kAllVendors), 0u);
-    const DeviceOwner device = makeDevice();
-    EXPECT_FALSE(device->isInitialized());
-    EXPECT_EQ(lines, "> CL Initialization\nCL 0 platforms\n");
-}
-
-TEST_F(Discovery, OtherFailuresToListPlatformsAreBrokenInvariants) {
-    driver().fail("clGetPlatformIDs", CL_OUT_OF_HOST_MEMORY, 1, 2);
-    EXPECT_THROW(zor::getDeviceCount(false, zor::kAllVendors), zor::Error);
-    EXPECT_THROW(makeDevice(), zor::Error);
-    driver().platforms.assign(16, {"Else", {gpu("a")}});
-    EXPECT_THROW(zor::getDeviceCount(false, zor::kAllVendors), zor::Error);
-    EXPECT_THROW(makeDevice(), zor::Error);
-    driver().platforms.pop_back();
-    EXPECT_EQ(zor::getDeviceCount(false, zor::kAllVendors), 15u);
-}
-
-TEST_F(Discovery, ADeviceCountWhoseQueryFailsIsZero) {
-    driver().platforms = {{"A", {gpu("a")}}, {"B", {gpu("b")}}};
+        {"Apple", {gpu("a"), cpu("x"), gpu("b")}}, {"Apple ", {gpu("c")}}, {"Intel(R) Corporation", {}}};
+    EXPECT_EQ(count(), 3u);
+    EXPECT_EQ(count(zor::kAllVendors, true), 1u);
+    EXPECT_EQ(count(zor::VENDOR_APPLE), 2u);
+    EXPECT_EQ(count(zor::VENDOR_UNKNOWN), 1u) << "texts are compared whole";
+    EXPECT_EQ(count(zor::VENDOR_INTEL | zor::VENDOR_NVIDIA), 0u);
+    const std::pair<uint32_t, const char*> names[] = {{0, "a"}, {1, "b"}, {2, "c"}, {3, "c"}, {0x7FFFFFFF, "c"}};
+    for (const auto& [index, name] : names) EXPECT_EQ(chosen({.deviceIndex = index}), name);
+    EXPECT_EQ(chosen({.deviceType = 7}), "x") << "any type but 0 is the CPU";
+    EXPECT_EQ(chosen({.vendorMask = ~zor::VENDOR_APPLE}), "c");
     driver().fail("clGetDeviceIDs", CL_OUT_OF_RESOURCES);
-    EXPECT_EQ(zor::getDeviceCount(false, zor::kAllVendors), 1u);
-    driver().fail("clGetDeviceIDs", CL_OUT_OF_RESOURCES);
-    EXPECT_EQ(chosenName(0), "b");
+    EXPECT_EQ(count(), 1u) << "a platform whose query fails has none";
 }
 
-TEST_F(Discovery, DevicesAreIndexedAcrossPlatformsAndTheLastOneServesBeyond) {
-    driver().platforms = {{"A", {gpu("a"), cpu("x"), gpu("b")}}, {"B", {gpu("c")}}};
-    EXPECT_EQ(chosenName(0), "a");
-    EXPECT_EQ(chosenName(1), "b");
-    EXPECT_EQ(chosenName(2), "c");
-    EXPECT_EQ(chosenName(3), "c");
-    EXPECT_EQ(chosenName(0x7FFFFFFF), "c");
-    EXPECT_EQ(chosenName(0xFFFFFFFF), "a") << "-1, which callers do not pass";
-    EXPECT_EQ(opencl(makeDevice({.deviceType = 7})).deviceName(), "x") << "any type but 0 is the CPU";
+TEST_F(Discovery, PrintsWhatItFindsAndCountsOneQuarrionPlatform) {
+    const std::string quarrion = "Quarrion, Inc.";
+    const struct {
+        std::vector<standin::Platform> platforms;
+        uint32_t count;
+        const char* found;
+    } machines[] = {{{}, 0, "CL 0 platforms\n"},
+                    {{{quarrion, {cpu("x")}}, {quarrion, {gpu("b")}}},
+                     0,
+                     "CL 2 platforms\nCL: 0 device (Quarrion, Inc.)\nCL: 0 device (Quarrion, Inc.)\n"},
+                    {{{quarrion, {gpu("  Big")}}, {quarrion, {gpu("b")}}},
+                     1,
+                     "CL 2 platforms\nCL: 1 device (Quarrion, Inc.)\nCL: 0 device (Quarrion, Inc.)\n[  Big]\n"
+                     "CL_DEVICE_MAX_WORK_ITEM_SIZES  : 1024, 1024, 64\nCL_DEVICE_MAX_WORK_GROUP_SIZE  : 1024\n"
+                     "CL_DEVICE_MAX_WORK_ITEM_DIMENSIONS : 3\n< CL Initialization\n"}};
+    for (const auto& [platforms, devices, found] : machines) {
+        driver().platforms = platforms;
+        EXPECT_EQ(makeDevice()->isInitialized(), devices > 0);
+        EXPECT_EQ(lines, std::string("> CL Initialization\n") + found);
+        const std::string warning = printed([&, expected = devices] { EXPECT_EQ(count(), expected); });
+        EXPECT_EQ(warning,
+                  platforms.size() < 2 ? "" : "WARNING : the system has more than 1 QUARRION platform installed\n");
+    }
 }
 
-TEST_F(Discovery, ThirtyTwoDevicesAreListedAndOneMoreIsTooMany) {
+TEST_F(Discovery, MoreThanTheListsHoldAndOtherFailuresAreBrokenInvariants) {
     driver().platforms = {{"A", std::vector(20, gpu("a"))}, {"B", std::vector(12, gpu("b"))}};
-    EXPECT_EQ(chosenName(31), "b");
+    EXPECT_EQ(chosen({.deviceIndex = 31}), "b");
     driver().platforms[1].devices.push_back(gpu("b"));
     EXPECT_THROW(makeDevice(), zor::Error);
-}
-
-TEST_F(Discovery, NoDeviceOfTheTypeLeavesAnEmptyDeviceThatRefusesWork) {
-    driver().platforms = {{"A", {cpu("x")}}};
-    const DeviceOwner device = makeDevice();
-    EXPECT_EQ(lines, "> CL Initialization\nCL 1 platforms\nCL: 0 device (A)\n");
-    EXPECT_EQ(device->getContext(), nullptr);
-    EXPECT_THROW(device->finish(), zor::Error);
-    EXPECT_THROW(device->flush(), zor::Error);
-    EXPECT_THROW(device->getKernel({.fileName = "f", .kernelName = "k"}), zor::Error);
-    EXPECT_THROW(device->queryGlobalMemorySize(), zor::Error);
-    char text[zor::kDeviceTextBytes] = "#";
-    EXPECT_THROW(device->getDeviceName(text), zor::Error);
-    device->getBoardName(text);
-    EXPECT_STREQ(text, "");
-    const zor::Buffer<char> buffer(*device, 16, zor::BUFFER_DEFAULT);
-    EXPECT_FALSE(buffer.hasMemory());
-}
-
-TEST_F(Discovery, PrintsTheStepsOfInitialisation) {
-    driver().platforms = {{"Apple", {gpu("  Big one")}}};
-    firstDevice().workItemSizes = {256, 128, 64};
-    firstDevice().workGroupSize = 256;
-    const DeviceOwner device = makeDevice();
-    EXPECT_EQ(lines,
-              "> CL Initialization\nCL 1 platforms\nCL: 1 device (Apple)\n[  Big one]\n"
-              "CL_DEVICE_MAX_WORK_ITEM_SIZES  : 256, 128, 64\nCL_DEVICE_MAX_WORK_GROUP_SIZE  : 256\n"
-              "CL_DEVICE_MAX_WORK_ITEM_DIMENSIONS : 3\n< CL Initialization\n");
-    EXPECT_EQ(driver().lastCall("clCreateCommandQueue").numbers, std::vector<uint64_t>{CL_QUEUE_PROFILING_ENABLE});
-    EXPECT_EQ(device->getTotalMemory(), firstDevice().globalMemory);
-    EXPECT_EQ(opencl(device).maxAllocation(), firstDevice().maxAllocation);
-}
-
-// Whatever call of initialisation fails, everything that was made before is released: TearDown counts the objects.
-TEST_F(Discovery, AFailureHalfWayReleasesWhatWasMade) {
-    const char* const required[] = {"clGetPlatformInfo", "clCreateContext", "clCreateCommandQueue"};
-    for (const char* call : required) {
-        driver().fail(call, CL_OUT_OF_RESOURCES);
-        EXPECT_THROW(makeDevice(), zor::Error) << call;
-    }
-    makeDevice();
-    const auto queries = static_cast<uint32_t>(driver().callCount("clGetDeviceInfo"));
-    uint32_t thrown = 0;
-    for (uint32_t at = 1; at <= queries; ++at) {
-        driver().fail("clGetDeviceInfo", CL_OUT_OF_RESOURCES, at);
-        try {
-            makeDevice();
-        } catch (const zor::Error&) {
-            ++thrown;
-        }
-        EXPECT_EQ(driver().liveObjects(), 0u) << "query " << at;
-    }
-    EXPECT_GE(thrown, 8u) << "all but the driver's version must be had";
-    EXPECT_LT(thrown, queries);
+    driver().platforms.assign(15, {"A", {gpu("a")}});
+    EXPECT_EQ(count(), 15u);
+    driver().platforms.push_back({"A", {}});
+    EXPECT_THROW(count(), zor::Error);
+    EXPECT_THROW(makeDevice(), zor::Error);
+    driver().fail("clGetPlatformIDs", CL_OUT_OF_HOST_MEMORY);
+    EXPECT_THROW(count(), zor::Error);
 }
 
 TEST_F(Discovery, SharesTheContextWithOpenGlWhereThatRunsOnTheChosenDevice) {
-    driver().platforms = {{"A", {gpu("a"), gpu("b")}}};
     const cl_context_properties pairs[] = {CL_GL_CONTEXT_KHR, 77, 0};
-    driver().glDevice = 1;
-    {
-        const DeviceOwner device = makeDevice({.deviceIndex = 1, .contextProperties = pairs});
-        EXPECT_TRUE(device->isGlShared());
-        const auto list = driver().lastCall("clCreateContext").numbers;
-        ASSERT_EQ(list.size(), 4u);
-        EXPECT_EQ(list[0], uint64_t{CL_GL_CONTEXT_KHR});
-        EXPECT_EQ(list[1], 77u);
-        EXPECT_EQ(list[2], 0x1084u);
-        EXPECT_EQ(driver().lastCall("clGetGLContextInfoKHR").numbers, list);
+    const struct {
+        const char* what;
+        size_t glDevice;
+        bool canTell;
+        const char* failing;
+        bool shared;
+    } cases[] = {{"it does", 1, true, "", true},
+                 {"another device does", 0, true, "", false},
+                 {"the driver cannot tell", 99, false, "", true},
+                 {"the question fails", 1, true, "clGetGLContextInfoKHR", false},
+                 {"the context fails", 1, true, "clCreateContext", false}};
+    for (const auto& [what, glDevice, canTell, failing, shared] : cases) {
+        zor::unloadOpenCL();  // with it the remembered address
+        driver().reset();
+        driver().platforms = {{"A", {gpu("a"), gpu("b")}}};
+        driver().glDevice = glDevice;
+        driver().hasGlContextInfo = canTell;
+        driver().fail(failing, CL_INVALID_OPERATION);
+        const DeviceOwner made = makeDevice({.deviceIndex = 1, .contextProperties = pairs});
+        EXPECT_TRUE(made->isInitialized()) << what;
+        EXPECT_EQ(made->isGlShared(), shared) << what;
+        const std::vector<uint64_t> list = driver().lastCall("clCreateContext").numbers;
+        ASSERT_EQ(list.size(), shared ? 4u : 0u) << what;
+        if (!shared) continue;
+        EXPECT_EQ((std::vector(list.begin(), list.begin() + 3)),
+                  (std::vector<uint64_t>{CL_GL_CONTEXT_KHR, 77, 0x1084}));
     }
-    const DeviceOwner other = makeDevice({.deviceIndex = 0, .contextProperties = pairs});
-    EXPECT_FALSE(other->isGlShared()) << "another device drives OpenGL";
-    EXPECT_TRUE(driver().lastCall("clCreateContext").numbers.empty());
-    EXPECT_LE(driver().callCount("clGetExtensionFunctionAddress"), 1u) << "looked up once per process";
-}
-
-TEST_F(Discovery, FallsBackToAPlainContextWhenTheSharedOneFails) {
-    const cl_context_properties pairs[] = {CL_GL_CONTEXT_KHR, 77, 0};
-    driver().fail("clCreateContext", CL_INVALID_PROPERTY);
-    const DeviceOwner device = makeDevice({.contextProperties = pairs});
-    EXPECT_TRUE(device->isInitialized());
-    EXPECT_FALSE(device->isGlShared());
-    EXPECT_EQ(driver().callCount("clCreateContext"), 2u);
-    driver().fail("clGetGLContextInfoKHR", CL_INVALID_OPERATION);
-    EXPECT_FALSE(makeDevice({.contextProperties = pairs})->isGlShared());
-}
-
-TEST_F(Discovery, AssumesTheChosenDeviceWhereTheDriverCannotTellOpenGls) {
-    zor::unloadOpenCL();  // with it the remembered address
-    driver().hasGlContextInfo = false;
-    driver().glDevice = 99;
-    const cl_context_properties pairs[] = {CL_GL_CONTEXT_KHR, 77, 0};
-    EXPECT_TRUE(makeDevice({.contextProperties = pairs})->isGlShared());
-    EXPECT_TRUE(makeDevice({.contextProperties = pairs})->isGlShared());
-    EXPECT_EQ(driver().callCount("clGetExtensionFunctionAddress"), 1u);
-    zor::unloadOpenCL();
-    ASSERT_EQ(zor::loadOpenCL(), 0);
-}
-
-TEST_F(Discovery, AContextTakesThirtyTwoPropertiesAndNoMore) {
-    std::vector<cl_context_properties> pairs(28, CL_GL_CONTEXT_KHR);
-    pairs.push_back(0);
-    EXPECT_TRUE(makeDevice({.contextProperties = pairs.data()})->isGlShared());
-    pairs.insert(pairs.begin(), 2, CL_GL_CONTEXT_KHR);
-    EXPECT_THROW(makeDevice({.contextProperties = pairs.data()}), zor::Error);
+    const std::vector<cl_context_properties> many(32, CL_GL_CONTEXT_KHR);
+    EXPECT_THROW(makeDevice({.contextProperties = many.data()}), zor::Error) << "more than the list holds";
 }

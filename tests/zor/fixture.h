@@ -5,7 +5,6 @@
 #include <gtest/gtest.h>
 #include <unistd.h>
 
-#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <memory>
@@ -34,93 +33,53 @@ std::string printed(Body body) {
         testing::internal::GetCapturedStdout();
         throw;
     }
-    std::fflush(stdout);
     return testing::internal::GetCapturedStdout();
 }
 
 inline std::string readText(const fs::path& path) {
-    std::ifstream file(path, std::ios::binary);
     std::ostringstream text;
-    text << file.rdbuf();
+    text << std::ifstream(path, std::ios::binary).rdbuf();
     return text.str();
 }
-
 inline void writeText(const fs::path& path, const std::string& text) {
     std::ofstream(path, std::ios::binary | std::ios::trunc) << text;
 }
 
-// A private folder, the working directory while the test runs.
-class InOwnFolder : public testing::Test {
+// A private folder is the working directory while the test runs.
+class OnStandin : public testing::Test {
  protected:
     void SetUp() override {
         std::string pattern = (fs::temp_directory_path() / "zor-test-XXXXXX").string();
         ASSERT_NE(mkdtemp(pattern.data()), nullptr);
-        folder = pattern;
-        before_ = fs::current_path();
-        fs::current_path(folder);
+        fs::current_path(folder = pattern);
         zor::setCacheDirectory("cache");
-    }
-    void TearDown() override {
-        if (folder.empty()) return;
-        fs::current_path(before_);
-        std::error_code ignored;
-        fs::remove_all(folder, ignored);
-    }
-
-    // Names of the files in the cache directory, sorted.
-    std::vector<std::string> cacheFiles() const {
-        std::vector<std::string> names;
-        std::error_code none;
-        for (const auto& file : fs::directory_iterator(folder / zor::cacheDirectory(), none))
-            names.push_back(file.path().filename().string());
-        std::sort(names.begin(), names.end());
-        return names;
-    }
-
-    fs::path folder;
-
- private:
-    fs::path before_;
-};
-
-class OnStandin : public InOwnFolder {
- protected:
-    void SetUp() override {
-        InOwnFolder::SetUp();
         ASSERT_NE(standin::findState(), nullptr) << "libOpenCL.so.1 is not the stand-in";
-        standin::state().reset();
+        driver().reset();
         ASSERT_EQ(zor::loadOpenCL(), 0);
+        device = makeDevice();
     }
     void TearDown() override {
-        standin::State& driver = standin::state();
-        EXPECT_EQ(driver.liveObjects(), 0u) << "an object was not released";
-        EXPECT_TRUE(driver.maps.empty()) << "a buffer was not unmapped";
-        EXPECT_THAT(driver.misuse, testing::IsEmpty());
-        driver.live.clear();
-        driver.maps.clear();
-        InOwnFolder::TearDown();
+        device.reset();
+        EXPECT_EQ(driver().liveObjects(), 0u) << "an object was not released";
+        EXPECT_TRUE(driver().maps.empty()) << "a buffer was not unmapped";
+        EXPECT_THAT(driver().misuse, testing::IsEmpty());
+        driver().live.clear();
+        driver().maps.clear();
+        fs::current_path("/");
+        fs::remove_all(folder);
     }
 
     // A device of the configuration; what creating it printed goes to lines.
     DeviceOwner makeDevice(const zor::DeviceConfig& config = {}) {
-        zor::Device* device = nullptr;
-        lines = printed([&] { device = zor::createDevice(zor::DEVICE_KIND_CL, config); });
-        return DeviceOwner(device);
+        zor::Device* made = nullptr;
+        lines = printed([&] { made = zor::createDevice(zor::DEVICE_KIND_CL, config); });
+        return DeviceOwner(made);
     }
-    static zor::DeviceCL& opencl(const DeviceOwner& device) { return dynamic_cast<zor::DeviceCL&>(*device); }
+    static zor::DeviceCL& opencl(const DeviceOwner& owner) { return dynamic_cast<zor::DeviceCL&>(*owner); }
+    static standin::State& driver() { return standin::state(); }
+    static standin::Device& firstDevice() { return driver().platforms.at(0).devices.at(0); }
 
-    standin::State& driver() { return standin::state(); }
-    standin::Device& firstDevice() { return driver().platforms.at(0).devices.at(0); }
-
+    fs::path folder;
+    DeviceOwner device;
     std::string lines;
 };
-
-template <class Query>
-std::string deviceText(Query query) {
-    // One byte past the promised capacity, which must stay as it is.
-    char text[zor::kDeviceTextBytes + 1];
-    std::fill(std::begin(text), std::end(text), '#');
-    query(text);
-    EXPECT_EQ(text[zor::kDeviceTextBytes], '#');
-    return text;
-}
