@@ -22,6 +22,16 @@
 
 __constant float kCoefficients[TAPS] = COEFFS;
 
+// One pixel of the vertical pass, without a tile or a block.
+static inline float4 SumColumn(__global const float4* srcBuffer, int2 size, int column, int row) {
+    float4 sum = (float4)(0.0f);
+    for (int i = 0; i < TAPS; ++i) {
+        const int tap_row = MirrorCoordinate(row - cRadius + i, size.y);
+        sum += ReadPixel_float_4(srcBuffer, size, column, tap_row) * kCoefficients[i];
+    }
+    return sum;
+}
+
 #if ON_CENTRAL_PROCESSOR
 
 // ---- Blocks of 32 pixels per item ----------------------------------------------------------------------------------
@@ -166,15 +176,6 @@ static inline void SumRows(float16* sums, __global const float4* srcBuffer, int2
     sums[3] = sum3;
 }
 
-static inline float4 SumColumn(__global const float4* srcBuffer, int2 size, int column, int row) {
-    float4 sum = (float4)(0.0f);
-    for (int i = 0; i < TAPS; ++i) {
-        const int tap_row = MirrorCoordinate(row - cRadius + i, size.y);
-        sum += ReadPixel_float_4(srcBuffer, size, column, tap_row) * kCoefficients[i];
-    }
-    return sum;
-}
-
 // Full blocks first: strip after strip, across each strip and down, so that a block finds in the cache the rows that
 // the blocks above it have read. Then, pixel by pixel, the columns and rows that fill no block.
 __kernel void GaussBlurVertKernel(src_float_4 srcBuffer, dstBufferType(dstBuffer)) {
@@ -224,7 +225,14 @@ __kernel void GaussBlurVertKernel(src_float_4 srcBuffer, dstBufferType(dstBuffer
 // ---- One pixel per item --------------------------------------------------------------------------------------------
 
 #if USE_TILE
-static inline float4 SumOfTile(__local const float4* tile, int local_index, int position, int size) {
+// The place, in the order of the pass, of entry i of the group's tile. Launches stay below 2^31 items, their halo may
+// not.
+static inline int TilePlace(int i, int count) {
+    return (int)clamp((long)get_global_id(0) - (long)get_local_id(0) + i - cRadius, 0L, (long)count - 1);
+}
+
+static inline float4 SumOfTile(__local const float4* tile, int position, int size) {
+    const int local_index = (int)get_local_id(0);
     float4 sum = (float4)(0.0f);
     if (position >= cRadius && position + cRadius < size) {
         for (int i = 0; i < TAPS; ++i) {
@@ -247,18 +255,15 @@ __kernel void GaussBlurHorKernel(srcBufferType(srcBuffer), dst_float_4 dstBuffer
     // A device that cannot run groups of 32 blurs without the tile; the choice is the same for all items.
     if (get_local_size(0) == BLOCK_SIZE) {
         const int count = size.x * size.y;
-        const int id = (int)get_global_id(0);
-        const int local_index = (int)get_local_id(0);
-        for (int i = local_index; i < TILEWIDTH; i += BLOCK_SIZE) {
-            // Launches stay below 2^31 items, their halo may not.
-            const int place = (int)clamp((long)id - local_index + i - cRadius, 0L, (long)count - 1);
+        for (int i = (int)get_local_id(0); i < TILEWIDTH; i += BLOCK_SIZE) {
+            const int place = TilePlace(i, count);
             tile[i] = ReadPixel(srcBuffer, place % size.x, place / size.x);
         }
         barrier(CLK_LOCAL_MEM_FENCE);
+        const int id = (int)get_global_id(0);
         if (id < count) {
-            const int column = id % size.x;
-            const float4 sum = SumOfTile(tile, local_index, column, size.x);
-            WritePixel_float_4(dstBuffer, size, column, id / size.x, sum);
+            const float4 sum = SumOfTile(tile, id % size.x, size.x);
+            WritePixel_float_4(dstBuffer, size, id % size.x, id / size.x, sum);
         }
         return;
     }
@@ -279,29 +284,22 @@ __kernel void GaussBlurVertKernel(src_float_4 srcBuffer, dstBufferType(dstBuffer
     __local float4 tile[TILEWIDTH];
     if (get_local_size(0) == BLOCK_SIZE) {
         const int count = size.x * size.y;
-        const int id = (int)get_global_id(0);
-        const int local_index = (int)get_local_id(0);
-        for (int i = local_index; i < TILEWIDTH; i += BLOCK_SIZE) {
-            const int place = (int)clamp((long)id - local_index + i - cRadius, 0L, (long)count - 1);
+        for (int i = (int)get_local_id(0); i < TILEWIDTH; i += BLOCK_SIZE) {
+            const int place = TilePlace(i, count);
             tile[i] = ReadPixel_float_4(srcBuffer, size, place / size.y, place % size.y);
         }
         barrier(CLK_LOCAL_MEM_FENCE);
+        const int id = (int)get_global_id(0);
         if (id < count) {
-            const int row = id % size.y;
-            const float4 sum = SumOfTile(tile, local_index, row, size.y);
-            WritePixel(dstBuffer, id / size.y, row, sum);
+            const float4 sum = SumOfTile(tile, id % size.y, size.y);
+            WritePixel(dstBuffer, id / size.y, id % size.y, sum);
         }
         return;
     }
 #endif
     int2 coord;
     GET_COORD(coord, size);
-    float4 sum = (float4)(0.0f);
-    for (int i = -cRadius; i <= cRadius; ++i) {
-        const int row = MirrorCoordinate(coord.y - i, size.y);
-        sum += ReadPixel_float_4(srcBuffer, size, coord.x, row) * kCoefficients[i + cRadius];
-    }
-    WritePixel(dstBuffer, coord.x, coord.y, sum);
+    WritePixel(dstBuffer, coord.x, coord.y, SumColumn(srcBuffer, size, coord.x, coord.y));
 }
 
 #endif
