@@ -7,17 +7,19 @@ namespace {
 
 uint64_t nextSerial = 1;
 
-// The list alone is freed when the library is unloaded. Objects still in it are left to the host's exit: destroying
-// them then could call into a driver that is already gone.
-struct LiveObjects {
-    std::vector<TovObject*>* list = nullptr;
+std::vector<TovObject*>* live = nullptr;
 
-    ~LiveObjects() {
-        delete list;
-        list = nullptr;  // a host that calls from its own exit handlers finds nothing, instead of freed memory
+// The list alone is freed when the library is unloaded. Objects still in it are left to the host's exit: destroying
+// them then could call into a driver that is already gone. A host that calls from its own exit handlers finds nothing
+// instead of freed memory; the pointer lies outside, for a compiler may drop what a destructor stores in its own
+// object.
+struct ListOwner {
+    ~ListOwner() {
+        delete live;
+        live = nullptr;
     }
 };
-LiveObjects live;
+const ListOwner listOwner{};
 
 }  // namespace
 
@@ -26,28 +28,28 @@ TovObject::TovObject(uint32_t type) noexcept : type_(type), serial_(nextSerial++
 namespace registry {
 
 void add(TovObject* object) {
-    if (live.list == nullptr) live.list = new std::vector<TovObject*>;
-    live.list->push_back(object);
+    if (live == nullptr) live = new std::vector<TovObject*>;
+    live->push_back(object);
 }
 
 std::ptrdiff_t find(const void* handle) noexcept {
     for (size_t i = 0; i < size(); ++i)
-        if ((*live.list)[i] == handle) return static_cast<std::ptrdiff_t>(i);
+        if ((*live)[i] == handle) return static_cast<std::ptrdiff_t>(i);
     return -1;
 }
 
 TovObject* lookUp(const void* handle) noexcept {
     const std::ptrdiff_t index = handle == nullptr ? -1 : find(handle);
-    return index < 0 ? nullptr : (*live.list)[static_cast<size_t>(index)];
+    return index < 0 ? nullptr : (*live)[static_cast<size_t>(index)];
 }
 
 void remove(std::ptrdiff_t index) noexcept {
-    const std::unique_ptr<TovObject> object((*live.list)[static_cast<size_t>(index)]);
-    live.list->erase(live.list->begin() + index);
+    const std::unique_ptr<TovObject> object((*live)[static_cast<size_t>(index)]);
+    live->erase(live->begin() + index);
 }
 
 size_t size() noexcept {
-    return live.list == nullptr ? 0 : live.list->size();
+    return live == nullptr ? 0 : live->size();
 }
 
 }  // namespace registry
