@@ -2,77 +2,67 @@
 
 #include <unistd.h>
 
-#include <cstring>
-
 namespace apitest {
 
 namespace {
 
 // Opened once per program, closed and cleaned up before it ends.
-class SharedDevice : public testing::Environment {
- public:
+struct SharedDevice : testing::Environment {
+    std::filesystem::path directory;
+    Handle context;
+
     void SetUp() override {
-        directory_ = std::filesystem::temp_directory_path() / ("tov-api-tests-" + std::to_string(getpid()));
-        std::filesystem::create_directories(directory_);
-        open(&context_);
+        directory = std::filesystem::temp_directory_path() / ("tov-api-tests-" + std::to_string(getpid()));
+        std::filesystem::create_directories(directory);
+        context = open();
     }
     void TearDown() override {
-        if (context_ != nullptr) {
-            EXPECT_EQ(tovObjectDelete(context_), TOV_SUCCESS);
-        }
+        context.remove();
         std::error_code ignored;
-        std::filesystem::remove_all(directory_, ignored);
+        std::filesystem::remove_all(directory, ignored);
     }
-    void open(tov_context* context) const {
+    Handle open() const {
+        Handle opened;
         EXPECT_EQ(tovCreateContext(TOV_API_VERSION, TOV_BACKEND_API_OPENCL, TOV_DEVICE_TYPE_CPU, 0,
-                                   directory_.string().c_str(), context),
+                                   directory.string().c_str(), opened.out()),
                   TOV_SUCCESS);
+        return opened;
     }
-    tov_context context() const { return context_; }
-    const std::filesystem::path& directory() const { return directory_; }
-
- private:
-    std::filesystem::path directory_;
-    tov_context context_ = nullptr;
 };
 auto* const shared = static_cast<SharedDevice*>(testing::AddGlobalTestEnvironment(new SharedDevice));
+
+struct Setter {
+    tov_image_filter filter;
+    const char* name;
+    int32_t operator()(uint32_t value) const { return tovImageFilterSetParameter1u(filter, name, value); }
+    int32_t operator()(float value) const { return tovImageFilterSetParameter1f(filter, name, value); }
+    int32_t operator()(const Matrix& value) const { return tovImageFilterSetParameter16f(filter, name, value.data()); }
+    int32_t operator()(tov_image value) const { return tovImageFilterSetParameterImage(filter, name, value); }
+    int32_t operator()(const std::vector<float>& value) const {
+        return tovImageFilterSetParameterFloatArray(filter, name, value.data(), static_cast<uint32_t>(value.size()));
+    }
+    int32_t operator()(const std::vector<tov_image>& value) const {
+        auto* images = const_cast<tov_image*>(value.data());  // the interface takes them without const
+        return tovImageFilterSetParameterImageArray(filter, name, images, static_cast<uint32_t>(value.size()));
+    }
+};
 
 }  // namespace
 
 int32_t setParameter(tov_image_filter filter, const Parameter& parameter) {
-    struct Setter {
-        tov_image_filter filter;
-        const char* name;
-        int32_t operator()(uint32_t value) const { return tovImageFilterSetParameter1u(filter, name, value); }
-        int32_t operator()(float value) const { return tovImageFilterSetParameter1f(filter, name, value); }
-        int32_t operator()(const Matrix& value) const {
-            return tovImageFilterSetParameter16f(filter, name, value.data());
-        }
-        int32_t operator()(tov_image value) const { return tovImageFilterSetParameterImage(filter, name, value); }
-        int32_t operator()(const std::vector<float>& value) const {
-            return tovImageFilterSetParameterFloatArray(filter, name, value.data(),
-                                                        static_cast<uint32_t>(value.size()));
-        }
-        int32_t operator()(const std::vector<tov_image>& value) const {
-            auto* images = const_cast<tov_image*>(value.data());  // the interface takes them without const
-            return tovImageFilterSetParameterImageArray(filter, name, images, static_cast<uint32_t>(value.size()));
-        }
-    };
     return std::visit(Setter{filter, parameter.name}, parameter.value);
 }
 
 tov_context DeviceTest::context() {
-    return shared->context();
+    return shared->context;
 }
 
 const std::filesystem::path& DeviceTest::cacheDirectory() {
-    return shared->directory();
+    return shared->directory;
 }
 
 Handle DeviceTest::newContext() {
-    Handle context;
-    shared->open(context.out());
-    return context;
+    return shared->open();
 }
 
 Handle DeviceTest::newImage(const tov_image_desc& desc, const void* data, tov_context owner) {
@@ -114,23 +104,18 @@ int32_t DeviceTest::execute(tov_image_filter filter, tov_image input, tov_image 
     return attached != TOV_SUCCESS ? attached : tovContextExecuteCommandQueue(context(), queue, nullptr, nullptr);
 }
 
-Picture DeviceTest::run(uint32_t type, const Picture& input, const Parameters& parameters) {
-    return run(type, input, parameters, Picture(input.width, input.height, input.layout));
-}
-
 Picture DeviceTest::run(uint32_t type, const Picture& input, const Parameters& parameters,
-                        const Picture& outputBefore) {
+                        const std::optional<Picture>& before) {
+    const Picture like = before.value_or(Picture(input.width, input.height, input.layout));
     const Handle source = newImage(input);
-    const Handle destination = newImage(outputBefore);
-    const Handle filter = newFilter(type, parameters);
-    EXPECT_EQ(execute(filter, source, destination), TOV_SUCCESS) << "filter type " << type;
-    return read(destination, outputBefore);
+    const Handle destination = newImage(like);
+    EXPECT_EQ(execute(newFilter(type, parameters), source, destination), TOV_SUCCESS) << "filter type " << type;
+    return read(destination, like);
 }
 
 Picture DeviceTest::runInPlace(uint32_t type, const Picture& input, const Parameters& parameters) {
     const Handle image = newImage(input);
-    const Handle filter = newFilter(type, parameters);
-    EXPECT_EQ(execute(filter, image, image), TOV_SUCCESS) << "filter type " << type;
+    EXPECT_EQ(execute(newFilter(type, parameters), image, image), TOV_SUCCESS) << "filter type " << type;
     return read(image, input);
 }
 

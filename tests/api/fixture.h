@@ -8,6 +8,7 @@
 #include <array>
 #include <cstdint>
 #include <filesystem>
+#include <optional>
 #include <string>
 #include <utility>
 #include <variant>
@@ -78,9 +79,9 @@ class DeviceTest : public testing::Test {
 
     // Attaches to a new queue and executes it.
     static int32_t execute(tov_image_filter filter, tov_image input, tov_image output);
-    // The output of a filter; a failure of any call is the test's.
-    static Picture run(uint32_t type, const Picture& input, const Parameters& parameters = {});
-    static Picture run(uint32_t type, const Picture& input, const Parameters& parameters, const Picture& outputBefore);
+    // The output of a filter, which is like the input or as given; a failure of any call is the test's.
+    static Picture run(uint32_t type, const Picture& input, const Parameters& parameters = {},
+                       const std::optional<Picture>& before = {});
     static Picture runInPlace(uint32_t type, const Picture& input, const Parameters& parameters = {});
 };
 

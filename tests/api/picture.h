@@ -36,7 +36,7 @@ struct Picture {
     Picture() = default;
     Picture(uint32_t w, uint32_t h, Layout pictureLayout = kFloat4);
 
-    tov_image_desc desc() const;
+    tov_image_desc desc() const { return {width, height, 1, 0, 0, layout.components, layout.type}; }
     size_t pixelCount() const { return size_t{width} * height; }
     // The pixel as kernels read it: RGBA, bytes as 0 ... 1, gray repeated, a missing alpha 1.
     Rgba at(uint32_t x, uint32_t y) const;
@@ -59,8 +59,5 @@ double maxDifference(const Picture& a, const Picture& b);
 // Largest difference over the larger of 1 and the reference's magnitude.
 double maxRelativeDifference(const Picture& picture, const Picture& reference);
 bool isFinite(const Picture& picture);
-
-uint16_t halfFromFloat(float value);  // round to nearest even
-float floatFromHalf(uint16_t bits);
 
 }  // namespace apitest

@@ -1,4 +1,4 @@
-// A context on the stand-in driver, and objects in it whose memory tells them apart.
+// Objects on the stand-in driver, deleted after each test, and images whose memory tells them apart.
 #pragma once
 
 #include <gmock/gmock.h>
@@ -17,9 +17,6 @@ namespace apitest {
 // No directory can be made there, so every program is compiled and nothing is stored.
 inline constexpr char kNoCache[] = "/dev/null/none";
 
-// First byte of the memory of an image, and the letter that stands for it.
-enum Mark : unsigned char { SOURCE = 'S', DESTINATION = 'D', AUXILIARY = 'A' };
-
 class StandinTest : public testing::Test {
  protected:
     void SetUp() override {
@@ -27,29 +24,44 @@ class StandinTest : public testing::Test {
         driver().reset();
     }
     void TearDown() override {
+        for (void* object : objects_) EXPECT_EQ(tovObjectDelete(object), TOV_SUCCESS);
         EXPECT_EQ(driver().liveObjects(), 0u);
         EXPECT_TRUE(driver().maps.empty()) << "something is still mapped";
         EXPECT_THAT(driver().misuse, testing::IsEmpty());
     }
     static standin::State& driver() { return standin::state(); }
 
-    static tov_context newContext(const char* cachePath = kNoCache) {
+    static tov_context newContext() {
         tov_context context = nullptr;
-        EXPECT_EQ(
-            tovCreateContext(TOV_API_VERSION, TOV_BACKEND_API_OPENCL, TOV_DEVICE_TYPE_GPU, 0, cachePath, &context),
-            TOV_SUCCESS);
+        EXPECT_EQ(tovCreateContext(TOV_API_VERSION, 0, TOV_DEVICE_TYPE_GPU, 0, kNoCache, &context), TOV_SUCCESS);
         return context;
     }
-    static tov_image newImage(tov_context context, const tov_image_desc& desc, Mark mark) {
-        tov_image image = nullptr;
-        EXPECT_EQ(tovContextCreateImage(context, &desc, nullptr, &image), TOV_SUCCESS);
-        void* pixels = nullptr;
-        if (tovImageMap(image, 0, &pixels) == TOV_SUCCESS) {
-            *static_cast<unsigned char*>(pixels) = mark;
-            EXPECT_EQ(tovImageUnmap(image, pixels), TOV_SUCCESS);
-        }
-        return image;
+    // Opens the GPU as it is scripted by then.
+    void open() {
+        context_ = objects_.emplace_back(newContext());
+        EXPECT_EQ(tovContextCreateCommandQueue(context_, &queue_), TOV_SUCCESS);
+        objects_.push_back(queue_);
     }
+    // An image of zeros but for its first byte.
+    tov_image newImage(const tov_image_desc& desc, char mark = 'S') {
+        std::vector<char> bytes(size_t{desc.image_width} * desc.image_height * 16, 0);
+        bytes[0] = mark;
+        EXPECT_EQ(tovContextCreateImage(context_, &desc, bytes.data(), &objects_.emplace_back()), TOV_SUCCESS);
+        return objects_.back();
+    }
+    tov_image_filter newFilter(uint32_t type) {
+        EXPECT_EQ(tovContextCreateImageFilter(context_, type, &objects_.emplace_back()), TOV_SUCCESS);
+        return objects_.back();
+    }
+    int32_t execute() { return tovContextExecuteCommandQueue(context_, queue_, nullptr, nullptr); }
+    int32_t attachAndExecute(tov_image_filter filter, tov_image input, tov_image output) {
+        EXPECT_EQ(tovCommandQueueAttachImageFilter(queue_, filter, input, output), TOV_SUCCESS);
+        return execute();
+    }
+
+    tov_context context_ = nullptr;
+    tov_command_queue queue_ = nullptr;
+    std::vector<void*> objects_;
 };
 
 }  // namespace apitest

@@ -105,6 +105,19 @@ TEST_F(TextureSharing, AcquiresAroundEachRunWhatItsFiltersReadAndWrite) {
     attach(inner, wrapped());
     EXPECT_EQ(callsOfRun(), "AAKRRAAKRRAAKRR") << "what an inner filter reads, too";
     EXPECT_THAT(driver().launches[0].options, testing::HasSubstr("srcBuffer_COMP_NUM= -D srcBuffer_COMP_TYPE=sampler"));
+    EXPECT_EQ(driver().callCount("clEnqueueCopyImage"), 3u) << "no kernel reads and writes one texture, wrapped twice";
+}
+
+TEST_F(TextureSharing, AcquiresTheImageArraysOfInnerFilters) {
+    tov_image images[] = {wrapped()};
+    tov_image_filter product = nullptr;
+    ASSERT_EQ(tovContextCreateImageFilter(context_, TOV_IMAGE_FILTER_MULTIPLY, &product), TOV_SUCCESS);
+    objects_.push_back(product);
+    ASSERT_EQ(tovImageFilterSetParameterImageArray(product, "inputs", &images[0], 1), TOV_SUCCESS);
+    ASSERT_EQ(tovImageFilterSetParameter1u(product, "inputsNum", 1), TOV_SUCCESS);
+    ASSERT_EQ(tovImageFilterSetParameterImage(product, "srcBuffer", wrapped()), TOV_SUCCESS);
+    attach(product, wrapped());
+    EXPECT_EQ(callsOfRun(), "AAAKRRR");
 }
 
 TEST_F(TextureSharing, ReleasesEverythingWhenTheRunFails) {
