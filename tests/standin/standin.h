@@ -89,8 +89,7 @@ struct State {
     // What the machine offers. Without platforms clGetPlatformIDs gives -1001.
     std::vector<Platform> platforms = {{.devices = {gpu("Stand-in GPU"), cpu("Stand-in CPU")}}};
     std::string buildLog;                         // of every build
-    bool hasGlContextInfo = true;                 // clGetGLContextInfoKHR can be found
-    size_t glDevice = 0;                          // the device that it names, of the first platform
+    size_t glDevice = 0;                          // the device of the first platform that runs OpenGL
     int32_t eventStatus = CL_SUBMITTED;           // of all events
     uint64_t queueThread = 0;                     // answers the vendor-specific queue query 0x403E
     std::function<void(const Launch&)> onLaunch;  // called at each launch, may read and write bytesOf()

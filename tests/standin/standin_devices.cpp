@@ -8,24 +8,32 @@ constexpr cl_device_info kBoardName = 0x4038;
 constexpr cl_command_queue_info kQueueThread = 0x403E;
 constexpr int32_t kNoPlatform = -1001;
 
-// Handles stay valid whatever the script says: their indices are looked up at each call.
+// Handles are numbers and stay valid whatever the script says: platform times 64, plus the device, plus 1.
 template <class Handle>
-Handle* handleOf(size_t platform, size_t index) {
-    static auto& handles = *new std::map<std::pair<size_t, size_t>, Handle>;
-    return &(handles[{platform, index}] = {{platform, index}});
+Handle handleOf(size_t platform, size_t device = 0) {
+    return reinterpret_cast<Handle>(platform * 64 + device + 1);
 }
 
-const Platform* scripted(cl_platform_id id) {
-    return id != nullptr && id->platform < script().platforms.size() ? &script().platforms[id->platform] : nullptr;
+const Platform* platformOf(const void* id) {
+    const size_t index = (reinterpret_cast<size_t>(id) - 1) / 64;
+    return index < script().platforms.size() ? &script().platforms[index] : nullptr;
 }
 
-const Device* scripted(cl_device_id id) {
-    const Platform* const platform = id != nullptr ? scripted(handleOf<_cl_platform_id>(id->platform, 0)) : nullptr;
-    return platform != nullptr && id->index < platform->devices.size() ? &platform->devices[id->index] : nullptr;
+const Device* deviceOf(cl_device_id id) {
+    const Platform* const platform = platformOf(id);
+    const size_t index = (reinterpret_cast<size_t>(id) - 1) % 64;
+    return platform != nullptr && index < platform->devices.size() ? &platform->devices[index] : nullptr;
 }
 
 std::string textOf(const std::string& text) {
     return {text.c_str(), text.size() + 1};
+}
+
+// A property list without its ending zero.
+std::vector<uint64_t> numbersOf(const cl_context_properties* properties) {
+    std::vector<uint64_t> list;
+    for (; properties != nullptr && *properties != 0; ++properties) list.push_back(static_cast<uint64_t>(*properties));
+    return list;
 }
 
 }  // namespace
@@ -63,12 +71,6 @@ int32_t answer(const Answers& answers, cl_uint key, size_t capacity, void* out, 
     return CL_SUCCESS;
 }
 
-std::vector<uint64_t> numbersOf(const cl_context_properties* properties) {
-    std::vector<uint64_t> list;
-    for (; properties != nullptr && *properties != 0; ++properties) list.push_back(static_cast<uint64_t>(*properties));
-    return list;
-}
-
 }  // namespace standin
 
 using namespace standin;
@@ -82,35 +84,34 @@ STANDIN_API cl_int clGetPlatformIDs(cl_uint capacity, cl_platform_id* out, cl_ui
     const size_t platforms = script().platforms.size();
     if (platforms == 0) return kNoPlatform;
     if (count != nullptr) *count = static_cast<cl_uint>(platforms);
-    for (size_t i = 0; i < std::min<size_t>(capacity, platforms); ++i) out[i] = handleOf<_cl_platform_id>(i, 0);
+    for (size_t i = 0; i < std::min<size_t>(capacity, platforms); ++i) out[i] = handleOf<cl_platform_id>(i);
     return CL_SUCCESS;
 }
 
 STANDIN_API cl_int clGetPlatformInfo(cl_platform_id id, cl_platform_info key, size_t capacity, void* out,
                                      size_t* size) {
     if (const int32_t status = enter({"clGetPlatformInfo"})) return status;
-    if (scripted(id) == nullptr) return CL_INVALID_PLATFORM;
-    return answer({{CL_PLATFORM_VENDOR, textOf(scripted(id)->vendor)}}, key, capacity, out, size);
+    if (platformOf(id) == nullptr) return CL_INVALID_PLATFORM;
+    return answer({{CL_PLATFORM_VENDOR, textOf(platformOf(id)->vendor)}}, key, capacity, out, size);
 }
 
 STANDIN_API cl_int clGetDeviceIDs(cl_platform_id id, cl_device_type type, cl_uint capacity, cl_device_id* out,
                                   cl_uint* count) {
     if (const int32_t status = enter({"clGetDeviceIDs"})) return status;
-    if (scripted(id) == nullptr) return CL_INVALID_PLATFORM;
-    const std::vector<Device>& devices = scripted(id)->devices;
-    cl_uint found = 0;
-    for (size_t i = 0; i < devices.size(); ++i) {
-        if ((devices[i].type & type) == 0) continue;
-        if (found < capacity) out[found] = handleOf<_cl_device_id>(id->platform, i);
-        ++found;
+    std::vector<cl_device_id> found;
+    for (auto handle = reinterpret_cast<size_t>(id);; ++handle) {
+        auto* const device = reinterpret_cast<cl_device_id>(handle);
+        if (deviceOf(device) == nullptr) break;
+        if ((deviceOf(device)->type & type) != 0) found.push_back(device);
     }
-    if (count != nullptr) *count = found;
-    return found > 0 ? CL_SUCCESS : CL_DEVICE_NOT_FOUND;
+    if (count != nullptr) *count = static_cast<cl_uint>(found.size());
+    std::copy_n(found.begin(), std::min<size_t>(capacity, found.size()), out);
+    return found.empty() ? CL_DEVICE_NOT_FOUND : CL_SUCCESS;
 }
 
 STANDIN_API cl_int clGetDeviceInfo(cl_device_id id, cl_device_info key, size_t capacity, void* out, size_t* size) {
     if (const int32_t status = enter({"clGetDeviceInfo"})) return status;
-    const Device* const device = scripted(id);
+    const Device* const device = deviceOf(id);
     if (device == nullptr) return CL_INVALID_DEVICE;
     const std::vector<size_t>& sizes = device->workItemSizes;
     const Answers answers = {
@@ -133,7 +134,7 @@ STANDIN_API cl_context clCreateContext(const cl_context_properties* properties, 
                                        void(CL_CALLBACK*)(const char*, const void*, size_t, void*), void*,
                                        cl_int* out) {
     int32_t status = enter({"clCreateContext", {}, numbersOf(properties)});
-    if (status == CL_SUCCESS && scripted(*devices) == nullptr) status = CL_INVALID_DEVICE;
+    if (status == CL_SUCCESS && deviceOf(*devices) == nullptr) status = CL_INVALID_DEVICE;
     return give(out, status, std::make_unique<_cl_context>(_cl_context{*devices}));
 }
 
@@ -150,9 +151,13 @@ STANDIN_RELEASE(clReleaseCommandQueue, cl_command_queue)
 
 STANDIN_QUERY(clGetCommandQueueInfo, cl_command_queue, {{kQueueThread, bytesOfValue(script().queueThread)}})
 
-STANDIN_COMMAND(clFinish)
+STANDIN_API cl_int clFinish(cl_command_queue queue) {
+    return enter({"clFinish"}, queue);
+}
 
-STANDIN_COMMAND(clFlush)
+STANDIN_API cl_int clFlush(cl_command_queue queue) {
+    return enter({"clFlush"}, queue);
+}
 
 STANDIN_API cl_event clCreateUserEvent(cl_context, cl_int* out) {
     return give(out, CL_SUCCESS, std::make_unique<_cl_event>());
@@ -170,11 +175,10 @@ STANDIN_RELEASE(clReleaseEvent, cl_event)
 static cl_int contextInfo(const cl_context_properties* properties, cl_gl_context_info key, size_t capacity, void* out,
                           size_t* size) {
     if (const int32_t status = enter({"clGetGLContextInfoKHR", {}, numbersOf(properties)})) return status;
-    return answer({{CL_DEVICES_FOR_GL_CONTEXT_KHR, bytesOfValue(handleOf<_cl_device_id>(0, script().glDevice))}}, key,
+    return answer({{CL_DEVICES_FOR_GL_CONTEXT_KHR, bytesOfValue(handleOf<cl_device_id>(0, script().glDevice))}}, key,
                   capacity, out, size);
 }
 
 STANDIN_API void* clGetExtensionFunctionAddress(const char* name) {
-    const bool found = script().hasGlContextInfo && std::strcmp(name, "clGetGLContextInfoKHR") == 0;
-    return found ? reinterpret_cast<void*>(&contextInfo) : nullptr;
+    return std::strcmp(name, "clGetGLContextInfoKHR") == 0 ? reinterpret_cast<void*>(&contextInfo) : nullptr;
 }

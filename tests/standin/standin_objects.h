@@ -19,11 +19,6 @@ struct Kind {
 
 }  // namespace standin
 
-struct Index {
-    size_t platform, index;
-};
-struct _cl_platform_id : Index {};
-struct _cl_device_id : Index {};
 struct _cl_context {
     static constexpr standin::Kind kKind{"context", CL_INVALID_CONTEXT};
     cl_device_id device = nullptr;
@@ -88,22 +83,15 @@ std::string bytesOfValue(const Value& value) {
 using Answers = std::map<cl_uint, std::string>;
 int32_t answer(const Answers& answers, cl_uint key, size_t capacity, void* out, size_t* outSize);
 
-// A property list without its ending zero.
-std::vector<uint64_t> numbersOf(const cl_context_properties* properties);
-
 }  // namespace standin
 
-// Entry points that differ in name and handle alone: releases, commands without effect, queries with their answers.
+// Entry points that differ in name and handle alone: releases, and queries with their answers.
 #define STANDIN_RELEASE(call, Handle)                                              \
     STANDIN_API cl_int call(Handle object) {                                       \
         if (const int32_t status = standin::enter({#call}, object)) return status; \
         standin::script().live.erase(object);                                      \
         delete object;                                                             \
         return CL_SUCCESS;                                                         \
-    }
-#define STANDIN_COMMAND(call)                         \
-    STANDIN_API cl_int call(cl_command_queue queue) { \
-        return standin::enter({#call}, queue);        \
     }
 #define STANDIN_QUERY(call, Handle, ...)                                                               \
     STANDIN_API cl_int call(Handle object, cl_uint key, size_t capacity, void* out, size_t* outSize) { \

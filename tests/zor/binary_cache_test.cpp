@@ -89,7 +89,7 @@ TEST_F(BinaryCache, AProgramToBeWrittenAfterItsRunIsWrittenByTheFirstLaunchThatS
     EXPECT_FALSE(compiles());
 }
 
-TEST_F(BinaryCache, ABinaryMustBeNewerThanItsSourceItsDependenciesAndTheLibrary) {
+TEST_F(BinaryCache, ABinaryMustBeNewerThanItsSourceAndItsDependencies) {
     const std::string_view dependencies[] = {"missing.h", "common.cl"};
     request.dependencies = dependencies;
     EXPECT_TRUE(compiles());
@@ -100,13 +100,9 @@ TEST_F(BinaryCache, ABinaryMustBeNewerThanItsSourceItsDependenciesAndTheLibrary)
         EXPECT_FALSE(compiles()) << file;
         fs::last_write_time(file, time);
         EXPECT_TRUE(compiles()) << file << ": equal times are not current";
+        fs::remove(file);
     }
     EXPECT_EQ(driver().lastCall("clCreateProgramWithSource").text, source);
-    fs::last_write_time(binary(), fs::last_write_time(fs::read_symlink("/proc/self/exe")) - 1s);
-    fs::remove("Filters.cl");
-    fs::remove("common.cl");
-    EXPECT_TRUE(compiles());
-    EXPECT_FALSE(compiles());
 }
 
 TEST_F(BinaryCache, AnotherProcessCompilesNothingUntilTheLibraryIsInstalledAnew) {
@@ -230,18 +226,18 @@ TEST_F(BinaryCache, AFileThatCannotBeWrittenWholeLeavesNothingBehind) {
     EXPECT_EQ(files(), 1u) << "the side file alone";
 }
 
-TEST_F(BinaryCache, OfASourceFileIsComparedWithItAndEveryDependency) {
-    request = {.fileName = "own", .kernelName = "k"};
+TEST_F(BinaryCache, OfASourceFileIsComparedWithItAndItsDependencies) {
+    const auto now = fs::file_time_type::clock::now();
+    const std::string_view dependencies[] = {"missing.h", "used.h"};
+    request = {.fileName = "own", .kernelName = "k", .dependencies = dependencies};
     printed([&] { EXPECT_EQ(device->getKernel(request), nullptr) << "there is no such file"; });
     writeText("own.cl", "kernel void k() {} // own");
+    fs::last_write_time("own.cl", now - 1h);
     EXPECT_TRUE(compiles(std::nullopt));
     EXPECT_EQ(driver().lastCall("clCreateProgramWithSource").text, readText("own.cl"));
     EXPECT_EQ(driver().lastCall("clBuildProgram").text, "-I ..\\..\\");
-    const std::string_view dependencies[] = {"missing.h", "used.h"};
-    request.dependencies = dependencies;
-    EXPECT_FALSE(compiles(std::nullopt));
     writeText("used.h", "");
-    fs::last_write_time("used.h", fs::last_write_time("own.cl") + 1h);
+    fs::last_write_time("used.h", now + 1h);
     EXPECT_TRUE(compiles(std::nullopt));
     fs::remove("used.h");
     fs::remove("own.cl");

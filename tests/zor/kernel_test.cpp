@@ -68,13 +68,11 @@ TEST_F(Kernels, LaunchWholeGroupsWithinTheDevicesLimits) {
         std::array<int32_t, 4> wish;
         Sizes global, local;
     } cases[] = {
-        {{1024, 1024, 1024}, {1920, 1080, 8, 8}, {1920, 1080}, {8, 8}},
         {{1024, 1024, 1024}, {0, 0, 8, 4}, {8, 4}, {8, 4}},
         {{1024, 1024, 1024}, {INT32_MAX, 1, 64, 1}, {size_t{1} << 31, 1}, {64, 1}},
         {{48, size_t{3} << 30, size_t{1} << 40}, {100, 100, 64, 8}, {144, 104}, {48, 8}},
         {{48, size_t{3} << 30, size_t{1} << 40}, {10, 10, -1, 0}, {48, 10}, {48, 1}},  // as unsigned, and at least 1
         {{1024, 1024, 256}, {100, 100, 64, 16}, {112, 112}, {16, 16}},
-        {{1024, 1024, 1}, {3, 3, 8, 8}, {3, 3}, {1, 1}},
     };
     for (const auto& [limits, wish, global, local] : cases) {
         firstDevice().workItemSizes = {limits[0], limits[1], 1};
