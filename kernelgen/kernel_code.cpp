@@ -110,7 +110,9 @@ void ParseKernel(TovKernelCode& code, const std::string& kernelName, std::string
 
 const TovKernelCode& embeddedKernelCode(const std::string& sourceName, const std::string& kernelName) {
     static std::map<std::pair<std::string, std::string>, TovKernelCode> parsed;
-    const auto [entry, isNew] = parsed.try_emplace({sourceName, kernelName});
-    if (isNew) ParseKernel(entry->second, kernelName, findKernelSource(sourceName));
-    return entry->second;
+    const std::pair key(sourceName, kernelName);
+    if (const auto known = parsed.find(key); known != parsed.end()) return known->second;
+    TovKernelCode code;
+    ParseKernel(code, kernelName, findKernelSource(sourceName));
+    return parsed.emplace(key, std::move(code)).first->second;
 }

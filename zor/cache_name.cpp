@@ -89,7 +89,7 @@ bool isCacheable(const DeviceCL& device) noexcept {
            device.driverVersion().find_first_of(kForbiddenInNames) == std::string::npos;
 }
 
-void createCacheDirectory() noexcept {
+void createCacheDirectory() {
     std::error_code ignored;
     std::filesystem::create_directory(cacheDirectory(), ignored);
 }

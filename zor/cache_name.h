@@ -22,6 +22,6 @@ uint64_t programIdentity(const DeviceCL& device, std::string_view fileName, std:
 bool isCacheable(const DeviceCL& device) noexcept;
 
 // One level; that it exists already or cannot be made is no error.
-void createCacheDirectory() noexcept;
+void createCacheDirectory();
 
 }  // namespace zor

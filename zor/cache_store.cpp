@@ -52,12 +52,13 @@ std::string programBinary(cl_program program) {
     return binary;
 }
 
-void removeFile(const std::string& path) noexcept {
+// Paths, not texts: nothing is allocated where nothing may be thrown.
+void removeFile(const fs::path& path) noexcept {
     std::error_code ignored;
     fs::remove(path, ignored);
 }
 
-bool renameFile(const std::string& from, const std::string& to) noexcept {
+bool renameFile(const fs::path& from, const fs::path& to) noexcept {
     std::error_code error;
     fs::rename(from, to, error);
     return !error;
@@ -72,8 +73,8 @@ class TemporaryFile {
         const auto now = static_cast<uint64_t>(std::chrono::steady_clock::now().time_since_epoch().count());
         const std::string name =
             ".tmp-" + std::to_string(processNumber()) + "-" + std::to_string(calls++) + "-" + hexadecimal(now, 16);
-        path_ = (fs::path(neighbour).parent_path() / name).string();
-        File file(std::fopen(path_.c_str(), "wbx"), std::fclose);
+        path_ = fs::path(neighbour).parent_path() / name;
+        File file(std::fopen(path_.string().c_str(), "wbx"), std::fclose);
         if (file == nullptr) return;
         exists_ = true;
         const bool whole = std::fwrite(content.data(), 1, content.size(), file.get()) == content.size();
@@ -86,14 +87,14 @@ class TemporaryFile {
     }
 
     bool written() const noexcept { return written_; }
-    bool renameTo(const std::string& path) noexcept {
+    bool renameTo(const fs::path& path) noexcept {
         if (!renameFile(path_, path)) return false;
         exists_ = false;
         return true;
     }
 
  private:
-    std::string path_;
+    fs::path path_;
     bool exists_ = false;
     bool written_ = false;
 };
@@ -121,11 +122,13 @@ std::optional<std::string> loadBinary(const CacheEntry& entry) {
 }
 
 bool storeBinary(const CacheEntry& entry, const std::string& binary) {
+    const fs::path binaryFile(entry.path);
+    const fs::path sideFile(sidePath(entry));
     TemporaryFile side(entry.path, sideText(entry, binary));
     TemporaryFile program(entry.path, binary);
-    if (!side.written() || !program.written() || !side.renameTo(sidePath(entry))) return false;
-    if (program.renameTo(entry.path)) return true;
-    removeFile(sidePath(entry));
+    if (!side.written() || !program.written() || !side.renameTo(sideFile)) return false;
+    if (program.renameTo(binaryFile)) return true;
+    removeFile(sideFile);
     return false;
 }
 
@@ -134,7 +137,7 @@ void writeProgram(cl_program program, const CacheEntry& entry) {
     if (!binary.empty() && storeBinary(entry, binary)) std::printf("Cached file created %s\n", entry.path.c_str());
 }
 
-void removeBinary(const CacheEntry& entry) noexcept {
+void removeBinary(const CacheEntry& entry) {
     removeFile(entry.path);
     removeFile(sidePath(entry));
 }

@@ -20,7 +20,7 @@ bool storeBinary(const CacheEntry& entry, const std::string& binary);
 // Stores a program's binary as the driver has it now, and prints a line; what cannot be stored is silently not cached.
 void writeProgram(cl_program program, const CacheEntry& entry);
 
-void removeBinary(const CacheEntry& entry) noexcept;
+void removeBinary(const CacheEntry& entry);
 
 // The whole of a regular file.
 std::optional<std::string> readFile(const std::string& path);

@@ -22,7 +22,7 @@ struct FileTimes {
 };
 
 #ifdef _WIN32
-FileTimes timesOf(const std::string& path) noexcept {
+FileTimes timesOf(const std::string& path) {
     std::error_code error;
     const auto time = std::filesystem::last_write_time(path, error);
     if (error) return {};
@@ -59,7 +59,7 @@ FileTime nanoseconds(const timespec& time) noexcept {
     return FileTime{time.tv_sec} * 1'000'000'000 + FileTime{time.tv_nsec};
 }
 
-FileTimes timesOf(const std::string& path) noexcept {
+FileTimes timesOf(const std::string& path) {
     struct stat info = {};
     if (stat(path.c_str(), &info) != 0) return {};
     return {nanoseconds(modificationTime(info)), nanoseconds(changeTime(info))};
@@ -105,17 +105,17 @@ bool canOpen(const std::string& path) {
 
 }  // namespace
 
-bool fileExists(const std::string& path) noexcept {
+bool fileExists(const std::string& path) {
     std::error_code error;
     return std::filesystem::exists(path, error);
 }
 
-FileTime libraryTime() noexcept {
+FileTime libraryTime() {
     const FileTimes times = timesOf(libraryFile);
     return std::max(times.modified, times.changed);
 }
 
-bool isNewerThanLibrary(const std::string& binary) noexcept {
+bool isNewerThanLibrary(const std::string& binary) {
     return timesOf(binary).modified > libraryTime();
 }
 

@@ -12,13 +12,13 @@ namespace zor {
 using FileTime = int64_t;
 
 // Whether something is there under the name.
-bool fileExists(const std::string& path) noexcept;
+bool fileExists(const std::string& path);
 
 // When the library file that carries this code was written or installed: the later of its modification and
 // status-change times. 0 where it cannot be told.
-FileTime libraryTime() noexcept;
+FileTime libraryTime();
 
 // The binary was written after the library file.
-bool isNewerThanLibrary(const std::string& binary) noexcept;
+bool isNewerThanLibrary(const std::string& binary);
 
 }  // namespace zor
