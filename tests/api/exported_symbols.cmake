@@ -9,11 +9,6 @@ foreach(declaration IN LISTS declarations)
                    "${name}")
     list(APPEND expected ${name})
 endforeach()
-list(LENGTH expected count)
-if(NOT count EQUAL 27)
-    message(FATAL_ERROR "the header declares ${count} functions, not 27")
-endif()
-
 execute_process(COMMAND ${NM} -D --defined-only --format=posix ${LIBRARY} OUTPUT_VARIABLE table COMMAND_ERROR_IS_FATAL
                                                                                                 ANY)
 string(REGEX REPLACE " [^\n]*\n" ";" exported "${table}")
