@@ -96,7 +96,6 @@ TEST_F(Resampling, AnUnknownOperatorIsRefusedWithALine) {
     const Handle image = newImage(noise(4, 4));
     const Handle output = newImage(noise(3, 3));
     const Handle filter = newFilter(TOV_IMAGE_FILTER_RESAMPLE, {{"interpOperator", 3u}});
-    const std::string printed =
-        printedBy([&] { EXPECT_EQ(execute(filter, image, output), TOV_ERROR_INVALID_PARAMETER); });
-    EXPECT_THAT(printed, testing::HasSubstr("interpOperator is 3"));
+    const auto refused = [&] { EXPECT_EQ(execute(filter, image, output), TOV_ERROR_INVALID_PARAMETER); };
+    EXPECT_THAT(printedBy(refused), testing::HasSubstr("interpOperator is 3"));
 }

@@ -147,7 +147,7 @@ TEST_F(FusedPictures, OfAResamplingRootTakeTheSourceSizeFromTheTree) {
 }
 
 TEST_F(FusedPictures, InPlaceEqualThoseOutOfPlace) {
-    for (const size_t i : {8, 6}) {  // one that reads its neighbours, one that does not
+    for (const size_t i : {8u, 6u}) {  // one that reads its neighbours, one that does not
         const std::vector<Fusable> chain = {kFusable[i], kFusable[2]};
         const Handle image = newImage(picture_);
         const Handle inner = newFilter(chain[0].type, chain[0].parameters);
