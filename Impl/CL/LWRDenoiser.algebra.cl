@@ -116,7 +116,8 @@ static inline int Decompose(Column* u, Column* v, float* s2) {
                 const float r = DotColumns(u[k], u[k]);
                 s2[j] = q;
                 s2[k] = r;
-                if (q >= r && (q <= e2 * s2[0] || fabs(p) <= tol * q)) {
+                // Columns without length stay: relaxed math may divide by way of an inverse, which overflows.
+                if (fmax(q, r) < 1e-30f || (q >= r && (q <= e2 * s2[0] || fabs(p) <= tol * q))) {
                     --rotations;
                     continue;
                 }

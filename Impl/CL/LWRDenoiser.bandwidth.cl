@@ -139,7 +139,7 @@ static inline void EstimateBandwidths(IMAGE_PARAMETERS, const Window* window, co
     inverse_squares[0] = inverse_squares[1] = (float8)(0.0f);
     for (int i = 1; i <= rank; ++i) {
         const float curvature = 2.0f * Mean3(fabs(coefficients[rank + i]));
-        ((float*)inverse_squares)[i] = (curvature + 0.16f) / (factor * factor);
+        ((float*)inverse_squares)[i] = (curvature + 0.16f) / fmax(factor * factor, 1e-30f);
     }
 }
 

@@ -29,7 +29,7 @@ static inline float SmoothedScale(__local const float* tile, int2 place) {
 
 __kernel void LWRDenoiserFirstPass(srcBufferType(srcBuffer), srcBufferType(vColorBuff), srcBufferType(transBuff),
                                    srcBufferType(vTransBuff), srcBufferType(normalsBuff), srcBufferType(vNormalsBuff),
-                                   srcBufferType(depthBuff), srcBufferType(vDepthBuff), int samples, int halfWindow,
+                                   srcBufferType(depthBuff), srcBufferType(vDepthBuff), uint samples, int halfWindow,
                                    float bandwidthFactor, dstBufferType(dstBuffer)) {
     __local float tile[BLOCK_SIZE * BLOCK_SIZE];
     const int2 size = GET_BUFFER_SIZE(dstBuffer);

@@ -31,7 +31,7 @@ typedef struct {
     for (int y = (window)->low.y; y <= (window)->high.y; ++y) \
         for (int x = (window)->low.x; x <= (window)->high.x; ++x)
 
-static inline Window WindowAt(int2 centre, int2 size, int half_window, int samples) {
+static inline Window WindowAt(int2 centre, int2 size, int half_window, uint samples) {
     Window window;
     window.centre = centre;
     window.low = max(centre - half_window, (int2)(0));
