@@ -248,12 +248,13 @@ __kernel void SobelOperatorKernel(srcBufferType(srcBuffer), dstBufferType(dstBuf
 
 #endif
 
-// With the components (p, q, r, t): (r / t) * (1 - (p / r) / (q / r)), where r cancels; 0 where a divisor is 0.
+// With the components (p, q, r, t): (r / t) * (1 - (p / r) / (q / r)), where r cancels; 0 where a divisor is 0 or so
+// small that its inverse overflows.
 __kernel void ShadowCatcherKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer)) {
     int2 coord;
     GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
     const float4 layers = ReadPixel(srcBuffer, coord.x, coord.y);
-    const bool divisible = layers.y != 0.0f && layers.z != 0.0f && layers.w != 0.0f;
+    const bool divisible = all(fabs(layers.yzw) >= (float3)(1.17549435e-38f)) != 0;
     const float2 quotients = divisible ? layers.xz / layers.yw : (float2)(0.0f);
     const float matte = quotients.y * (1.0f - quotients.x);
     const float4 result = (float4)(matte, matte, matte, 1.0f);

@@ -109,7 +109,7 @@ TEST_F(PerPixelFilters, FollowTheirFormulasAndStayFiniteWhereTheseDivideByZero) 
                                      1e-5f, 1,    -2,   0.5f, 20,   -1,   20000, 5000,  12000, 1});
     const Picture zeros =
         beginning({0, 0, 0,        0,       -0.0f, -0.0f, -0.0f,  1,      -1,     -1,     -1, 1, 1e-40f, 0,
-                   0, 1, -0.7152f, 0.2126f, 0,     1,     1e-30f, 1e-30f, 1e-30f, 1e-30f, 3,  0, 0,      -1});
+                   0, 1, -0.7152f, 0.2126f, 0,     1,     1e-40f, 1e-40f, 1e-40f, 1e-40f, 3,  0, 0,      -1});
     for (const auto& [type, tolerance, formula, parameters] : rows) {
         SCOPED_TRACE(testing::Message() << "type " << type << ", " << parameters.size() << " parameters");
         EXPECT_LE(maxRelativeDifference(run(type, input, parameters), mapped(input, kFloat4, formula)), tolerance);
