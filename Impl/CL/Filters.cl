@@ -34,14 +34,6 @@ __kernel void NormalizationKernel(srcBufferType(srcBuffer), dstBufferType(dstBuf
     WritePixel(dstBuffer, coord.x, coord.y, result);
 }
 
-__kernel void GammaCorrectionKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cGamma) {
-    int2 coord;
-    GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
-    const float4 color = ReadPixel(srcBuffer, coord.x, coord.y);
-    const float4 result = applyGammaCorrection(cGamma, color);
-    WritePixel(dstBuffer, coord.x, coord.y, result);
-}
-
 // Linear conversion between RGB spaces by way of CIE XYZ.
 __kernel void ColorSpaceKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), Mat4n3 cRgb2Xyz, Mat4n3 cXyz2Rgb) {
     int2 coord;
@@ -59,6 +51,30 @@ __kernel void ColorSpaceKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer
                                       dot3F4(cXyz2Rgb.row2, blue), 0.0f);
     float4 result = from_red * color.x + from_green * color.y + from_blue * color.z;
     result.w = color.w;
+    WritePixel(dstBuffer, coord.x, coord.y, result);
+}
+
+__kernel void LinearToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cKey) {
+    int2 coord;
+    GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
+    const float4 color = ReadPixel(srcBuffer, coord.x, coord.y);
+    float4 result = color * cKey;
+    result.w = color.w;
+    WritePixel(dstBuffer, coord.x, coord.y, result);
+}
+
+// ---- Kernels that stand here twice ---------------------------------------------------------------------------------
+//
+// The first, one pixel per item, keeps to the form in which it can be fused, and fusion takes it from the text wherever
+// it runs. The second is for central processors: an item in eight takes the pixels of all eight side by side.
+
+#if !ON_CENTRAL_PROCESSOR
+
+__kernel void GammaCorrectionKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cGamma) {
+    int2 coord;
+    GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
+    const float4 color = ReadPixel(srcBuffer, coord.x, coord.y);
+    const float4 result = applyGammaCorrection(cGamma, color);
     WritePixel(dstBuffer, coord.x, coord.y, result);
 }
 
@@ -84,97 +100,38 @@ __kernel void SimpleToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(ds
 }
 
 // E. Reinhard et al., "Photographic Tone Reproduction for Digital Images" (2002), the global operator.
-//
-// With L = key * luminance the pixel is scaled by Ld / luminance, where Ld is L / (1 + L) mixed with L, or with a white
-// point w, L (1 + L / w^2) / (1 + L). Ld holds L as a factor, so the luminance cancels and black stays black.
 __kernel void ReinhardToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cKey,
                                         float cWPoint, float cBurn) {
     int2 coord;
     GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
     const float4 color = ReadPixel(srcBuffer, coord.x, coord.y);
-    // The bound keeps the products below finite; the curve is flat long before.
-    const float lightness = clamp(cKey * Luminance(color), -1e28f, 1e28f);
-    const float divisor = 1.0f + lightness;
-    const float compression = divisor != 0.0f ? 1.0f / divisor : 0.0f;
-    // Both curves are key * (constant + (1 - constant + slope * L) / (1 + L)).
-    const bool has_white = cWPoint >= 0.00001f;
-    const float constant_part = has_white ? 0.0f : cBurn;
-    const float slope = has_white ? 1.0f / (cWPoint * cWPoint) : 0.0f;
-    const float scale = cKey * (constant_part + (1.0f - constant_part + slope * lightness) * compression);
-    float4 result = color * scale;
+    float4 result = color * ReinhardScale(Luminance(color), cKey, cWPoint, cBurn);
     result.w = color.w;
     WritePixel(dstBuffer, coord.x, coord.y, result);
 }
 
 // F. Drago et al., "Adaptive Logarithmic Mapping for Displaying High Contrast Scenes" (2003).
-//
-// With Y the luminance over its average, the pixel is scaled by ln(1 + Y) / Y over the other terms. That quotient is 1
-// at Y = 0, so black stays black. All logarithms have base 2, which cancels.
 __kernel void DragoToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cBias,
                                      float avLum, float maxLum) {
     int2 coord;
     GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
     const float4 color = ReadPixel(srcBuffer, coord.x, coord.y);
-    const float brightness = Luminance(color);
-    // No logarithm here has a value at -1 or below.
-    const float adapted = clamp(brightness / avLum, -0.99999994f, 1e37f);
-    const float portion = clamp(brightness / maxLum, -1e37f, 1e37f);
-    const float brightest = clamp(maxLum / avLum, -0.99999994f, 1e37f);
-
-    // Logarithms of 1 + Y, of the portion and of 1 + the greatest Y. While a sum 1 + Y has the exponent 0, Y itself is
-    // its mantissa less 1 and has all its digits, which the sum has lost.
-    const float4 arguments = (float4)(1.0f + adapted, fmax(fabs(portion), 1e-37f), 1.0f + brightest, 1.0f);
-    float4 exponents;
-    float4 mantissas = SplitMantissa(arguments, &exponents);
-    mantissas.x = exponents.x == 0.0f ? adapted : mantissas.x;
-    mantissas.z = exponents.z == 0.0f ? brightest : mantissas.z;
-    const float4 quotients = Log2Quotient(mantissas);
-    const float4 logarithms = quotients * mantissas + exponents;
-    const float compression = exponents.x == 0.0f ? quotients.x : logarithms.x / adapted;
-
-    // (luminance / maximum) ^ (ln bias / ln 0.5), for a negative base only where the exponent is whole.
-    const float exponent = -Log2((float4)(fmax(cBias, 1e-37f))).x;
-    const float magnitude = Exp2((float4)(clamp(logarithms.y * exponent, -120.0f, 120.0f))).x;
-    const int whole = NearestInt((float4)(exponent)).x;
-    const float mirrored = (float)whole != exponent ? 0.0f : ((whole & 1) != 0 ? -magnitude : magnitude);
-    const float power = portion < 0.0f ? mirrored : magnitude;
-
-    const float interpolation = Log2((float4)(fmax(2.0f + 8.0f * power, 1e-37f))).x;
-    const float divisor = interpolation * logarithms.z * (avLum * 0.30103f);
-    const float scale = divisor != 0.0f ? compression / divisor : 0.0f;
-    float4 result = color * scale;
+    float4 result = color * DragoScaleOf8((float8)(Luminance(color)), cBias, avLum, maxLum).s0;
     result.w = color.w;
     WritePixel(dstBuffer, coord.x, coord.y, result);
 }
 
-__kernel void LinearToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cKey) {
-    int2 coord;
-    GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
-    const float4 color = ReadPixel(srcBuffer, coord.x, coord.y);
-    float4 result = color * cKey;
-    result.w = color.w;
-    WritePixel(dstBuffer, coord.x, coord.y, result);
-}
-
-// intensity * (1 - exp(-exposure * RGB)).
 __kernel void ExponentialToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cExposure,
                                            float cIntensity) {
     int2 coord;
     GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
     const float4 color = ReadPixel(srcBuffer, coord.x, coord.y);
-    const float4 absorbed = Exp2Minus1(clamp(color * (cExposure * -1.44269504f), -126.0f, 127.0f));
-    float4 result = absorbed * -cIntensity;
+    float4 result = ExposedFilm(LowerHalf(color), cExposure).lo * cIntensity;
     result.w = color.w;
     WritePixel(dstBuffer, coord.x, coord.y, result);
 }
 
 // Magnitude of the luminance gradient, by the 3 x 3 Sobel operator with the edge pixels repeated.
-//
-// The kernel stands here twice. The first, one pixel per item, keeps to the form in which it can be fused, and fusion
-// takes it from the text wherever it runs. The second takes blocks of 8 x 8 pixels per item on central processors: a
-// luminance is computed once instead of for each of its eight neighbours.
-#if !ON_CENTRAL_PROCESSOR
-
 __kernel void SobelOperatorKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer)) {
     int2 coord;
     GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
@@ -203,7 +160,77 @@ __kernel void SobelOperatorKernel(srcBufferType(srcBuffer), dstBufferType(dstBuf
     WritePixel(dstBuffer, coord.x, coord.y, result);
 }
 
+// With the components (p, q, r, t): (r / t) * (1 - (p / r) / (q / r)), where r cancels; 0 where a divisor is 0 or so
+// small that its inverse overflows.
+__kernel void ShadowCatcherKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer)) {
+    int2 coord;
+    GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
+    const float4 layers = ReadPixel(srcBuffer, coord.x, coord.y);
+    const bool divisible = all(fabs(layers.yzw) >= (float3)(1.17549435e-38f)) != 0;
+    const float2 quotients = divisible ? layers.xz / layers.yw : (float2)(0.0f);
+    const float matte = quotients.y * (1.0f - quotients.x);
+    const float4 result = (float4)(matte, matte, matte, 1.0f);
+    WritePixel(dstBuffer, coord.x, coord.y, result);
+}
+
 #else
+
+INLINED float16 GammaOf4(float16 pixels, float gamma) {
+    if (gamma == 1.0f) {
+        return pixels;
+    }
+    const float exponent = 1.0f / gamma;
+    return WithAlphaOf(pixels, (float16)(DisplayPower(pixels.lo, exponent), DisplayPower(pixels.hi, exponent)));
+}
+
+__kernel void GammaCorrectionKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cGamma) {
+    SHADE_ROW(left = GammaOf4(left, cGamma);
+              right = GammaOf4(right, cGamma))
+}
+
+INLINED float16 FilmicCurve(float16 pixels) {
+    const float16 bounded = clamp(pixels, 0.0f, 10000.0f);
+    const float16 numerator = bounded * (2.51f * bounded + 0.03f);
+    const float16 denominator = (2.43f * bounded + 0.59f) * bounded + 0.14f;
+    return clamp(numerator / denominator, 0.0f, 1.0f);
+}
+
+INLINED float16 SimpleToneOf4(float16 pixels, float exposure, float contrast, bool curved) {
+    const float16 stretched = pixels * contrast + 0.5f * (1.0f - contrast);
+    const float16 exposed = stretched * exp2(clamp(exposure, -126.0f, 127.0f));
+    return Opaque(curved ? FilmicCurve(exposed) : exposed);
+}
+
+__kernel void SimpleToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cExposure,
+                                      float cContrast, int cApplyToneMap) {
+    SHADE_ROW(left = SimpleToneOf4(left, cExposure, cContrast, cApplyToneMap != 0);
+              right = SimpleToneOf4(right, cExposure, cContrast, cApplyToneMap != 0))
+}
+
+__kernel void ReinhardToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cKey,
+                                        float cWPoint, float cBurn) {
+    SHADE_ROW(const float8 factors = ReinhardScaleOf8(LuminancesOf8(left, right), cKey, cWPoint, cBurn);
+              left = ScaleColors(left, factors.lo);
+              right = ScaleColors(right, factors.hi))
+}
+
+__kernel void DragoToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cBias,
+                                     float avLum, float maxLum) {
+    SHADE_ROW(const float8 factors = DragoScaleOf8(LuminancesOf8(left, right), cBias, avLum, maxLum);
+              left = ScaleColors(left, factors.lo);
+              right = ScaleColors(right, factors.hi))
+}
+
+INLINED float16 ExposedOf4(float16 pixels, float exposure, float intensity) {
+    const float16 colors = (float16)(ExposedFilm(pixels.lo, exposure), ExposedFilm(pixels.hi, exposure));
+    return WithAlphaOf(pixels, colors * intensity);
+}
+
+__kernel void ExponentialToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cExposure,
+                                           float cIntensity) {
+    SHADE_ROW(left = ExposedOf4(left, cExposure, cIntensity);
+              right = ExposedOf4(right, cExposure, cIntensity))
+}
 
 #define SOBEL_SIDE 8
 #define SOBEL_REACH (SOBEL_SIDE + 2)
@@ -246,17 +273,21 @@ __kernel void SobelOperatorKernel(srcBufferType(srcBuffer), dstBufferType(dstBuf
     }
 }
 
-#endif
-
-// With the components (p, q, r, t): (r / t) * (1 - (p / r) / (q / r)), where r cancels; 0 where a divisor is 0 or so
-// small that its inverse overflows.
-__kernel void ShadowCatcherKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer)) {
-    int2 coord;
-    GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
-    const float4 layers = ReadPixel(srcBuffer, coord.x, coord.y);
-    const bool divisible = all(fabs(layers.yzw) >= (float3)(1.17549435e-38f)) != 0;
-    const float2 quotients = divisible ? layers.xz / layers.yw : (float2)(0.0f);
-    const float matte = quotients.y * (1.0f - quotients.x);
-    const float4 result = (float4)(matte, matte, matte, 1.0f);
-    WritePixel(dstBuffer, coord.x, coord.y, result);
+INLINED float8 ShadowMatteOf8(float16 left, float16 right) {
+    const float16 numerators = (float16)(left.even, right.even);
+    const float16 divisors = (float16)(left.odd, right.odd);
+    const float8 p = numerators.even;
+    const float8 r = numerators.odd;
+    const float8 q = divisors.even;
+    const float8 t = divisors.odd;
+    const float8 least = fmin(fmin(fabs(q), fabs(r)), fabs(t));
+    return least >= 1.17549435e-38f ? (r / t) * (1.0f - p / q) : 0.0f;
 }
+
+__kernel void ShadowCatcherKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer)) {
+    SHADE_ROW(const float8 mattes = ShadowMatteOf8(left, right);
+              left = Opaque(mattes.lo.s0000111122223333);
+              right = Opaque(mattes.hi.s0000111122223333))
+}
+
+#endif

@@ -15,6 +15,11 @@
 #define ON_CENTRAL_PROCESSOR 0
 #endif
 
+// Wide vectors are handed over between functions of one program only: how they would cross its border does not matter.
+#if ON_CENTRAL_PROCESSOR && defined(__clang__)
+#pragma clang diagnostic ignored "-Wpsabi"
+#endif
+
 // REPEAT(N, X) is X(0) X(1) ... X(N - 1).
 #define REPEAT_0(X)
 #define REPEAT_1(X) X(0)
@@ -305,71 +310,98 @@ static inline int MirrorCoordinate(int value, int size) {
 }
 
 // ---- Powers --------------------------------------------------------------------------------------------------------
+//
+// Eight at a time, as many as the vectors of central processors hold: two pixels, or one value of eight pixels. Others
+// drop the lanes that nobody reads.
 
 // log2(1 + f) / f and (2^f - 1) / f as minimax polynomials, from -0.3 to 0.42 and from -0.5 to 0.5; their relative
 // errors are 2e-7 and 1e-7.
-static inline float4 Log2Quotient(float4 f) {
+static inline float8 Log2Quotient(float8 f) {
     // Pairs of terms are independent of each other, which shortens the chain of operations.
-    const float4 f2 = f * f;
-    const float4 low = (0.480931163f - 0.360263467f * f) * f2 + (1.4426949f - 0.721352458f * f);
-    const float4 high = (0.235709637f - 0.149733275f * f) * f2 + (0.28686887f - 0.248322815f * f);
+    const float8 f2 = f * f;
+    const float8 low = (0.480931163f - 0.360263467f * f) * f2 + (1.4426949f - 0.721352458f * f);
+    const float8 high = (0.235709637f - 0.149733275f * f) * f2 + (0.28686887f - 0.248322815f * f);
     return high * (f2 * f2) + low;
 }
 
-static inline float4 Exp2Quotient(float4 f) {
-    const float4 high = (0.00134068541f * f + 0.00967160519f) * f + 0.0555031002f;
+static inline float8 Exp2Quotient(float8 f) {
+    const float8 high = (0.00134068541f * f + 0.00967160519f) * f + 0.0555031002f;
     return high * (f * f) + (0.240222409f * f + 0.693147242f);
 }
 
 // Splits positive, normal numbers into 2^exponent * (1 + f) with 1 + f between sqrt(1/2) and sqrt(2). Gives f.
-static inline float4 SplitMantissa(float4 value, float4* exponent) {
-    const int4 whole = (as_int4(value) - 0x3f3504f3) >> 23;
-    *exponent = convert_float4(whole);
-    return as_float4(as_int4(value) - (whole << 23)) - 1.0f;
+static inline float8 SplitMantissa(float8 value, float8* exponent) {
+    const int8 whole = (as_int8(value) - 0x3f3504f3) >> 23;
+    *exponent = convert_float8(whole);
+    return as_float8(as_int8(value) - (whole << 23)) - 1.0f;
 }
 
 // The nearest whole numbers, for magnitudes up to 2^22: at 1.5 * 2^23 the digits of a float are whole numbers. The
 // library's rint takes some thirty instructions on central processors.
-static inline int4 NearestInt(float4 value) {
-    return as_int4(value + 12582912.0f) - 0x4b400000;
+static inline int8 NearestInt(float8 value) {
+    return as_int8(value + 12582912.0f) - 0x4b400000;
 }
 
 // 2^n for n from -126 to 127.
-static inline float4 PowerOfTwo(int4 n) {
-    return as_float4((n << 23) + 0x3f800000);
+static inline float8 PowerOfTwo(int8 n) {
+    return as_float8((n << 23) + 0x3f800000);
 }
 
 // Logarithms of positive, normal numbers and powers of two from -126 to 127. Graphics processors have instructions for
 // both; on central processors the polynomials take a fraction of the library functions' time.
 #if ON_CENTRAL_PROCESSOR
-static inline float4 Log2(float4 value) {
-    float4 exponent;
-    const float4 f = SplitMantissa(value, &exponent);
+static inline float8 Log2Of8(float8 value) {
+    float8 exponent;
+    const float8 f = SplitMantissa(value, &exponent);
     return Log2Quotient(f) * f + exponent;
 }
 
-static inline float4 Exp2(float4 value) {
-    const int4 whole = NearestInt(value);
-    const float4 f = value - convert_float4(whole);
-    const float4 scale = PowerOfTwo(whole);
+static inline float8 Exp2Of8(float8 value) {
+    const int8 whole = NearestInt(value);
+    const float8 f = value - convert_float8(whole);
+    const float8 scale = PowerOfTwo(whole);
     return Exp2Quotient(f) * f * scale + scale;
 }
 #else
-static inline float4 Log2(float4 value) {
+static inline float8 Log2Of8(float8 value) {
     return native_log2(value);
 }
 
-static inline float4 Exp2(float4 value) {
+static inline float8 Exp2Of8(float8 value) {
     return native_exp2(value);
 }
 #endif
 
+// A vector of eight whose lower half counts.
+static inline float8 LowerHalf(float4 value) {
+    float8 both;
+    both.lo = value;
+    both.hi = value;
+    return both;
+}
+
+static inline float4 Log2(float4 value) {
+    return Log2Of8(LowerHalf(value)).lo;
+}
+
+static inline float4 Exp2(float4 value) {
+    return Exp2Of8(LowerHalf(value)).lo;
+}
+
 // 2^value - 1, exact to the last digits also near 0.
-static inline float4 Exp2Minus1(float4 value) {
-    const int4 whole = NearestInt(value);
-    const float4 f = value - convert_float4(whole);
-    const float4 scale = PowerOfTwo(whole);
+static inline float8 Exp2Minus1(float8 value) {
+    const int8 whole = NearestInt(value);
+    const float8 f = value - convert_float8(whole);
+    const float8 scale = PowerOfTwo(whole);
     return Exp2Quotient(f) * f * scale + (scale - 1.0f);
+}
+
+// Values clamped to 0 ... 10000 and raised to a power; 0 stays 0.
+static inline float8 DisplayPower(float8 value, float exponent) {
+    const float8 base = clamp(value, 0.0f, 10000.0f);
+    const float8 logarithm = Log2Of8(fmax(base, 1.17549435e-38f));
+    const float8 power = Exp2Of8(clamp(logarithm * exponent, -126.0f, 127.0f));
+    return select((float8)(0.0f), power, base > (float8)(0.0f));
 }
 
 // RGB clamped to 0 ... 10000 and raised to 1 / gamma; 0 stays 0. A gamma of 1 changes nothing.
@@ -377,11 +409,63 @@ static inline float4 applyGammaCorrection(float gamma, float4 rgba) {
     if (gamma == 1.0f) {
         return rgba;
     }
-    const float4 base = clamp(rgba, 0.0f, 10000.0f);
-    const float4 logarithm = Log2(fmax(base, 1.17549435e-38f));
-    const float4 power = Exp2(clamp(logarithm * (1.0f / gamma), -126.0f, 127.0f));
-    const float4 result = select((float4)(0.0f), power, base > (float4)(0.0f));
-    return (float4)(result.xyz, rgba.w);
+    return (float4)(DisplayPower(LowerHalf(rgba), 1.0f / gamma).s012, rgba.w);
+}
+
+// 1 - exp(-exposure * value).
+static inline float8 ExposedFilm(float8 value, float exposure) {
+    return -Exp2Minus1(clamp(value * (exposure * -1.44269504f), -126.0f, 127.0f));
+}
+
+// ---- Tone curves ---------------------------------------------------------------------------------------------------
+//
+// What a pixel's luminance asks its colour to be scaled by, for one luminance and for those of eight pixels.
+
+// With L = key * luminance the pixel is scaled by Ld / luminance, where Ld is L / (1 + L) mixed with L, or with a white
+// point w, L (1 + L / w^2) / (1 + L). Ld holds L as a factor, so the luminance cancels and black stays black. Both
+// curves are key * (constant + (1 - constant + slope * L) / (1 + L)). The bound on L keeps the products finite; the
+// curve is flat long before.
+#define DEFINE_REINHARD_SCALE(name, real)                                                                 \
+    static inline real name(real luminance, float key, float white_point, float burn) {                   \
+        const real lightness = clamp(key * luminance, -1e28f, 1e28f);                                     \
+        const real divisor = 1.0f + lightness;                                                            \
+        const real compression = divisor != 0.0f ? 1.0f / divisor : 0.0f;                                 \
+        const bool has_white = white_point >= 0.00001f;                                                   \
+        const float constant_part = has_white ? 0.0f : burn;                                              \
+        const float slope = has_white ? 1.0f / (white_point * white_point) : 0.0f;                        \
+        return key * (constant_part + (1.0f - constant_part + slope * lightness) * compression);          \
+    }
+DEFINE_REINHARD_SCALE(ReinhardScale, float)
+DEFINE_REINHARD_SCALE(ReinhardScaleOf8, float8)
+
+// log2(1 + value) for values above -1. While the sum has the exponent 0, the value itself is the sum's mantissa less 1
+// and has all its digits, which the sum has lost.
+static inline float8 Log2Of1Plus(float8 value) {
+    float8 exponent;
+    const float8 mantissa = SplitMantissa(1.0f + value, &exponent);
+    const float8 f = exponent == 0.0f ? value : mantissa;
+    return Log2Quotient(f) * f + exponent;
+}
+
+// With Y the luminance over its average, ln(1 + Y) / Y over the other terms. That quotient is 1 at Y = 0, so black
+// stays black. All logarithms have base 2, which cancels.
+static inline float8 DragoScaleOf8(float8 luminance, float bias, float average, float maximum) {
+    // No logarithm here has a value at -1 or below.
+    const float8 adapted = clamp(luminance / average, -0.99999994f, 1e37f);
+    const float8 compression = fabs(adapted) > 1e-30f ? Log2Of1Plus(adapted) / adapted : 1.44269504f;
+    const float8 brightest = (float8)(clamp(maximum / average, -0.99999994f, 1e37f));
+
+    // (luminance / maximum) ^ (ln bias / ln 0.5), for a negative base only where the exponent is whole.
+    const float8 portion = clamp(luminance / maximum, -1e37f, 1e37f);
+    const float exponent = -Log2((float4)(fmax(bias, 1e-37f))).x;
+    const float8 magnitude = Exp2Of8(clamp(Log2Of8(fmax(fabs(portion), 1e-37f)) * exponent, -120.0f, 120.0f));
+    const int whole = NearestInt((float8)(exponent)).s0;
+    const float sign_of_negative = (float)whole != exponent ? 0.0f : ((whole & 1) != 0 ? -1.0f : 1.0f);
+    const float8 power = portion < 0.0f ? sign_of_negative * magnitude : magnitude;
+
+    const float8 interpolation = Log2Of8(fmax(2.0f + 8.0f * power, 1e-37f));
+    const float8 divisor = interpolation * Log2Of1Plus(brightest) * (average * 0.30103f);
+    return divisor != 0.0f ? compression / divisor : 0.0f;
 }
 
 // ---- Interpolation -------------------------------------------------------------------------------------------------
