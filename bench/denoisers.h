@@ -6,7 +6,8 @@
 
 namespace bench {
 
-// Registers "arithmetic/peak" and "arithmetic/FILTER/1920x1080". Both must live until the benchmarks have run.
+// Registers "arithmetic/peak", "arithmetic/FILTER/1920x1080" and "first_frame/FILTER/1920x1080". Both must live until
+// the benchmarks have run.
 void registerDenoisers(const OpenCL& opencl, tov_context context);
 
 }  // namespace bench

@@ -70,6 +70,15 @@ bool isColor(Content content) noexcept {
 
 }  // namespace
 
+void applySettings(const FilterCase& what, tov_image_filter filter) {
+    for (const Setting& setting : what.settings) {
+        const auto* whole = std::get_if<uint32_t>(&setting.value);
+        check(whole != nullptr ? tovImageFilterSetParameter1u(filter, setting.name, *whole)
+                               : tovImageFilterSetParameter1f(filter, setting.name, std::get<float>(setting.value)),
+              setting.name);
+    }
+}
+
 FilterRun::FilterRun(const OpenCL* opencl, tov_context context, const FilterCase& what, const PictureLayout& layout)
     : opencl_(opencl), context_(context), what_(what), layout_(layout) {
     tov_image input = addImage(what.input);
@@ -78,7 +87,7 @@ FilterRun::FilterRun(const OpenCL* opencl, tov_context context, const FilterCase
     tov_image_filter filter = nullptr;
     check(tovContextCreateImageFilter(context, what.type, &filter), "tovContextCreateImageFilter");
     filter_.reset(filter);
-    applySettings();
+    applySettings(what, filter);
     bindFeatures();
     bindArrays();
     tov_command_queue queue = nullptr;
@@ -117,16 +126,6 @@ FilterRun::Image FilterRun::makeImage(const tov_image_desc& desc, size_t bytes, 
     }
     image.handle.reset(handle);
     return image;
-}
-
-void FilterRun::applySettings() {
-    for (const Setting& setting : what_.settings) {
-        const auto* whole = std::get_if<uint32_t>(&setting.value);
-        check(whole != nullptr
-                  ? tovImageFilterSetParameter1u(filter_.get(), setting.name, *whole)
-                  : tovImageFilterSetParameter1f(filter_.get(), setting.name, std::get<float>(setting.value)),
-              setting.name);
-    }
 }
 
 void FilterRun::bindFeatures() {

@@ -19,6 +19,8 @@ struct PictureLayout {
     uint32_t bytesPerPixel() const noexcept { return bytes ? 4 : 16; }
 };
 
+void applySettings(const FilterCase& what, tov_image_filter filter);
+
 class FilterRun {
  public:
     // With `opencl`, whose queue the context has adopted, the images lie in its buffers, otherwise in the library's.
@@ -29,6 +31,8 @@ class FilterRun {
     // Bytes that the algorithm has to move: each input read and each output written once.
     double bytesMoved() const noexcept { return static_cast<double>(bytesMoved_); }
 
+    tov_image inputImage() const noexcept { return images_[0].handle.get(); }
+    tov_image outputImage() const noexcept { return images_[1].handle.get(); }
     cl_mem input() const noexcept { return images_[0].memory.get(); }
     cl_mem output() const noexcept { return images_[1].memory.get(); }
     cl_mem feature(size_t index) const noexcept { return images_[2 + index].memory.get(); }
@@ -40,7 +44,6 @@ class FilterRun {
     };
     tov_image addImage(Content content);
     Image makeImage(const tov_image_desc& desc, size_t bytes, const void* pixels) const;
-    void applySettings();
     void bindFeatures();
     void bindArrays();
 

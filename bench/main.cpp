@@ -9,6 +9,7 @@
 
 #include "child.h"
 #include "denoisers.h"
+#include "fused_chain.h"
 #include "handle.h"
 #include "host_cost.h"
 #include "opencl.h"
@@ -28,8 +29,8 @@ struct Options {
 
 constexpr char kUsage[] =
     "usage: tov_bench [--device=gpu|cpu[:INDEX]] [--benchmark_filter=REGEX] [--benchmark_out=FILE.json] ...\n"
-    "Without a device: the first GPU, else the first CPU. Groups: throughput/, arithmetic/, startup/, creation/, "
-    "host/.\n";
+    "Without a device: the first GPU, else the first CPU. Groups: throughput/, fusion/, arithmetic/, "
+    "first_frame/, startup/, creation/, host/.\n";
 
 Options parse(int count, char** texts) {
     Options options;
@@ -71,6 +72,7 @@ int runAll(const std::string& deviceOption) {
     const OpenCL opencl(choice);
     const Handle context = adoptContext(opencl, cache.path());
     registerThroughput(opencl, context.get());
+    registerFusedChains(context.get());
     registerDenoisers(opencl, context.get());
     registerStartup(choice);
     registerHostCost(opencl, context.get(), cache.path());
