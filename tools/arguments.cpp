@@ -118,7 +118,7 @@ void addRun(CLI::App& app, RawArguments& raw) {
     addInput(*run, raw);
     run->add_option("-f,--filter", raw.stages, "Filter with its parameters: NAME[:param=value[,param=value...]]")
         ->required()
-        ->expected(1)
+        ->allow_extra_args(false)
         ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll)
         ->type_name("STAGE");
     run->add_option("--size", raw.size, "Size of what the resample stage makes, say 960x540")->type_name("WxH");
