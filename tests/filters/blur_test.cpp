@@ -41,7 +41,7 @@ TEST_F(GaussianBlur, PlainAndTiledMatchASeparableSumForAllSizesRadiiAndLayouts) 
                  {5, 3, 40, 9.0f, kFloat4, 8e-5},
                  {70, 31, 33, 10.0f, kFloat4, 6.8e-5},
                  {3, 65, 32, 8.0f, kFloat4, 6.6e-5},
-                 {19, 11, 4096, 5.0f, kFloat4, 8e-5},
+                 {3, 2, 4096, 5.0f, kFloat4, 8e-5},
                  {45, 14, 4, 2.0f, {3, TOV_COMPONENT_TYPE_UINT8}, 1.0},
                  {45, 14, 4, 2.0f, {4, TOV_COMPONENT_TYPE_FLOAT16}, 1.0 / 1024}};
     for (const auto& [width, height, radius, sigma, layout, tolerance] : cases) {
