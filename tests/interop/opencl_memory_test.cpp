@@ -39,7 +39,7 @@ class HostMemory : public DeviceTest {
     }
     cl_mem image2D(size_t width, size_t height, cl_channel_type type = CL_FLOAT, cl_mem_flags flags = 0) {
         const cl_image_format format = {CL_RGBA, type};
-        const cl_image_desc desc = {CL_MEM_OBJECT_IMAGE2D, width, height, 0, 0, 0, 0, 0, 0, {nullptr}};
+        const cl_image_desc desc = {CL_MEM_OBJECT_IMAGE2D, width, height, 0, 0, 0, 0, 0, 0, nullptr};
         return keep(clCreateImage(cl_.get(), flags, &format, &desc, nullptr, nullptr));
     }
     Handle wrapped(cl_mem memory, const tov_image_desc& desc, bool isImage, int32_t expected = TOV_SUCCESS) {
