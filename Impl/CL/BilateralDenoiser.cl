@@ -4,15 +4,7 @@
 // Definitions: radius, INPUTS_NUM. Colours are divided by alpha; where alpha is 0 they are taken as they are. The
 // neighbours of border pixels are clamped to the picture.
 
-#define MAX_INPUTS_NUM 6
-#if INPUTS_NUM > MAX_INPUTS_NUM
-#error Internal error: too lot of inputs!
-#endif
-
-// Lists of parameters whose length is INPUTS_NUM; each element brings the comma in front of it.
-#define input(itr) , srcBufferType(input##itr)
 #define SIGMA_DEF(n) , float sigma##n
-#define IMAGE_ARRAY(name, num) REPEAT(num, name)
 
 // Sigmas are positive. exp(-0.5 * d / sigma) is 2^(d * EXPONENT(sigma)).
 #define EXPONENT(sigma) (-0.5f * 1.44269504f / (sigma))

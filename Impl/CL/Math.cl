@@ -1,14 +1,6 @@
 // Sum and product of up to six images.
 
-#define MAX_INPUTS_NUM 6
-#if INPUTS_NUM > MAX_INPUTS_NUM
-#error Internal error: too lot of inputs!
-#endif
-
-// Lists of parameters whose length is INPUTS_NUM; each element brings the comma in front of it.
-#define input(itr) , srcBufferType(input##itr)
 #define WEIGHT_DEF(n) , float weight##n
-#define IMAGE_ARRAY(name, num) REPEAT(num, name)
 
 __kernel void WeightedSumKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer)
                                 IMAGE_ARRAY(input, INPUTS_NUM) REPEAT(INPUTS_NUM, WEIGHT_DEF)) {
