@@ -21,16 +21,6 @@
 
 typedef float8 __attribute__((aligned(4))) EightValues;
 
-// Exp2 of common.cl for eight values that are not above 0; below -126 they give the smallest normal number.
-static inline void Exp2OfEight(float8* value) {
-    const float8 exponent = fmax(*value, (float8)(-126.0f));
-    const int8 whole = as_int8(exponent + 12582912.0f) - 0x4b400000;
-    const float8 f = exponent - convert_float8(whole);
-    const float8 scale = as_float8((whole << 23) + 0x3f800000);
-    const float8 high = (0.00134068541f * f + 0.00967160519f) * f + 0.0555031002f;
-    *value = ((high * (f * f) + (0.240222409f * f + 0.693147242f)) * f + 1.0f) * scale;
-}
-
 // Puts a colour into three channels of a row.
 static inline void Stage(float (*channels)[WINDOW], int place, float4 rgba) {
     const float3 color = DivideByAlpha(rgba);
@@ -93,7 +83,7 @@ __kernel void BilateralFilterKernel(srcBufferType(srcBuffer), dstBufferType(dstB
             for (int i = 0; i <= 2 * radius; ++i) {
                 float8 weight = (float8)(0.0f);
                 REPEAT(INPUTS_NUM, ADD_DISTANCE)
-                Exp2OfEight(&weight);
+                weight = Exp2Of8(fmax(weight, -126.0f));
                 red += EIGHT(3 * INPUTS_NUM, i) * weight;
                 green += EIGHT(3 * INPUTS_NUM + 1, i) * weight;
                 blue += EIGHT(3 * INPUTS_NUM + 2, i) * weight;
