@@ -62,10 +62,10 @@ TEST_F(ExecutionChecks, ValuesWithWhichNoPixelCanBeComputedAreNamed) {
         {TOV_IMAGE_FILTER_TEMPORAL_ACCUMULATION, "positionsImg", {}, TOV_ERROR_INVALID_OPERATION},
         {TOV_IMAGE_FILTER_TEMPORAL_ACCUMULATION, "", {{"positionsImg", image}, {"outVarianceImg", tov_image{output_}}}},
     };
-    for (const auto& [type, named, parameters, code] : rows) {
-        int32_t got = TOV_SUCCESS;
-        EXPECT_THAT(printedBy([&] { got = codeOf(type, parameters); }), testing::HasSubstr(named)) << type;
-        EXPECT_EQ(got, code) << type << " " << named;
+    for (const auto& row : rows) {
+        int32_t code = TOV_SUCCESS;
+        EXPECT_THAT(printedBy([&] { code = codeOf(row.type, row.parameters); }), testing::HasSubstr(row.named));
+        EXPECT_EQ(code, row.code) << row.type << " " << row.named;
     }
     EXPECT_EQ(codeOf(TOV_IMAGE_FILTER_LINEAR_TONEMAP, {}), TOV_SUCCESS) << "the device stays usable";
 }
