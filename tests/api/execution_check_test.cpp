@@ -32,35 +32,35 @@ TEST_F(ExecutionChecks, ValuesWithWhichNoPixelCanBeComputedAreNamed) {
     const Parameter sigma = {"sigma", 1.0f};
     const Parameters seven = {{"inputs", Images(7, image)}, {"inputsNum", 7u}};
     const struct {
-        uint32_t type;
         const char* named;
         Parameters parameters;
+        uint32_t type;
         int32_t code = TOV_ERROR_INVALID_PARAMETER;
     } rows[] = {
-        {TOV_IMAGE_FILTER_GAMMA_CORRECTION, "cGamma", {{"cGamma", -0.0f}}},
-        {TOV_IMAGE_FILTER_GAMMA_CORRECTION, "cGamma", {{"cGamma", std::nanf("")}}},
-        {TOV_IMAGE_FILTER_MOTION_BUFFER, "viewProjMatrix", {{"viewProjMatrix", Matrix{0, 0, HUGE_VALF}}}},
-        {TOV_IMAGE_FILTER_DRAGO_TONEMAP, "avLum", {}},  // its default is 0
-        {TOV_IMAGE_FILTER_DRAGO_TONEMAP, "maxLum", {{"avLum", 1.0f}, {"maxLum", 0.0f}}},
-        {TOV_IMAGE_FILTER_GAUSSIAN_BLUR, "sigma", {}},                   // its default is 0
-        {TOV_IMAGE_FILTER_GAUSSIAN_BLUR, "sigma", {{"sigma", 1e-30f}}},  // whose square is 0
-        {TOV_IMAGE_FILTER_GAUSSIAN_BLUR, "4096", {sigma, {"radius", 4097u}}},
-        {TOV_IMAGE_FILTER_BILATERAL_DENOISE, "256", {{"radius", 257u}}},
-        {TOV_IMAGE_FILTER_BILATERAL_DENOISE, "sigmas", {one, number, {"sigmas", Floats{0}}}},
-        {TOV_IMAGE_FILTER_LWR_DENOISE, "bandwidth", {{"bandwidth", 0.0f}}},
-        {TOV_IMAGE_FILTER_EAW_DENOISE, "colorSigma", {{"colorSigma", 0.0f}}},
-        {TOV_IMAGE_FILTER_EAW_DENOISE, "normalSigma", {{"normalSigma", 0.0f}}},
-        {TOV_IMAGE_FILTER_EAW_DENOISE, "depthSigma", {{"depthSigma", 0.0f}}},
-        {TOV_IMAGE_FILTER_EAW_DENOISE, "transSigma", {{"transSigma", 0.0f}}},
-        {TOV_IMAGE_FILTER_WEIGHTED_SUM, "weights", {one, number, {"weights", Floats{HUGE_VALF}}}},
-        {TOV_IMAGE_FILTER_WEIGHTED_SUM, "inputs", {two, number, {"weights", Floats{1}}}},
-        {TOV_IMAGE_FILTER_MULTIPLY, "inputs", {number}},
-        {TOV_IMAGE_FILTER_MULTIPLY, "inputsNum", {two, {"inputsNum", UINT32_MAX}}},
-        {TOV_IMAGE_FILTER_MULTIPLY, "Internal error: too lot of inputs!", seven, TOV_ERROR_INTERNAL_ERROR},
-        {TOV_IMAGE_FILTER_COLOR_SPACE, "srcColorSpace", {{"srcColorSpace", 0u}}},
-        {TOV_IMAGE_FILTER_COLOR_SPACE, "dstColorSpace", {{"dstColorSpace", 5u}}},
-        {TOV_IMAGE_FILTER_TEMPORAL_ACCUMULATION, "positionsImg", {}, TOV_ERROR_INVALID_OPERATION},
-        {TOV_IMAGE_FILTER_TEMPORAL_ACCUMULATION, "", {{"positionsImg", image}, {"outVarianceImg", tov_image{output_}}}},
+        {"cGamma", {{"cGamma", -0.0f}}, TOV_IMAGE_FILTER_GAMMA_CORRECTION},
+        {"cGamma", {{"cGamma", std::nanf("")}}, TOV_IMAGE_FILTER_GAMMA_CORRECTION},
+        {"viewProjMatrix", {{"viewProjMatrix", Matrix{0, 0, HUGE_VALF}}}, TOV_IMAGE_FILTER_MOTION_BUFFER},
+        {"avLum", {}, TOV_IMAGE_FILTER_DRAGO_TONEMAP},  // its default is 0
+        {"maxLum", {{"avLum", 1.0f}, {"maxLum", 0.0f}}, TOV_IMAGE_FILTER_DRAGO_TONEMAP},
+        {"sigma", {}, TOV_IMAGE_FILTER_GAUSSIAN_BLUR},                   // its default is 0
+        {"sigma", {{"sigma", 1e-30f}}, TOV_IMAGE_FILTER_GAUSSIAN_BLUR},  // whose square is 0
+        {"4096", {sigma, {"radius", 4097u}}, TOV_IMAGE_FILTER_GAUSSIAN_BLUR},
+        {"256", {{"radius", 257u}}, TOV_IMAGE_FILTER_BILATERAL_DENOISE},
+        {"sigmas", {one, number, {"sigmas", Floats{0}}}, TOV_IMAGE_FILTER_BILATERAL_DENOISE},
+        {"bandwidth", {{"bandwidth", 0.0f}}, TOV_IMAGE_FILTER_LWR_DENOISE},
+        {"colorSigma", {{"colorSigma", 0.0f}}, TOV_IMAGE_FILTER_EAW_DENOISE},
+        {"normalSigma", {{"normalSigma", 0.0f}}, TOV_IMAGE_FILTER_EAW_DENOISE},
+        {"depthSigma", {{"depthSigma", 0.0f}}, TOV_IMAGE_FILTER_EAW_DENOISE},
+        {"transSigma", {{"transSigma", 0.0f}}, TOV_IMAGE_FILTER_EAW_DENOISE},
+        {"weights", {one, number, {"weights", Floats{HUGE_VALF}}}, TOV_IMAGE_FILTER_WEIGHTED_SUM},
+        {"inputs", {two, number, {"weights", Floats{1}}}, TOV_IMAGE_FILTER_WEIGHTED_SUM},
+        {"inputs", {number}, TOV_IMAGE_FILTER_MULTIPLY},
+        {"inputsNum", {two, {"inputsNum", UINT32_MAX}}, TOV_IMAGE_FILTER_MULTIPLY},
+        {"Internal error: too lot of inputs!", seven, TOV_IMAGE_FILTER_MULTIPLY, TOV_ERROR_INTERNAL_ERROR},
+        {"srcColorSpace", {{"srcColorSpace", 0u}}, TOV_IMAGE_FILTER_COLOR_SPACE},
+        {"dstColorSpace", {{"dstColorSpace", 5u}}, TOV_IMAGE_FILTER_COLOR_SPACE},
+        {"positionsImg", {}, TOV_IMAGE_FILTER_TEMPORAL_ACCUMULATION, TOV_ERROR_INVALID_OPERATION},
+        {"", {{"positionsImg", image}, {"outVarianceImg", tov_image{output_}}}, TOV_IMAGE_FILTER_TEMPORAL_ACCUMULATION},
     };
     for (const auto& row : rows) {
         int32_t code = TOV_SUCCESS;

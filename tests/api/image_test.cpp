@@ -12,27 +12,25 @@ class Images : public DeviceTest {};
 
 TEST_F(Images, AreOfTheSizeThatTheirDescriptorGivesAndWithoutStorageWhereThatIsNoneOrTooMuch) {
     const struct {
-        tov_image_desc desc;
         uint64_t bytes;
+        tov_image_desc desc;
         bool hasStorage;
     } rows[] = {
-        {{192, 108, 1, 204, 0, 4, kFloat}, 204 * 108 * 16, true},
-        {{192, 108, 1, 100, 0, 4, kFloat}, 100 * 108 * 16, true},
-        {{5, 2, 1, 0, 0, 3, kByte}, 30, true},
-        {{5, 2, 7, 0, 123, 1, kHalf}, 20, true},
-        {{0, 2, 1, 3, 0, 4, kByte}, 24, true},
-        {{5, 2, 1, 0, 0, 4, 0}, 0, false},
-        {{5, 2, 1, 0, 0, 4, 4}, 0, false},
-        {{5, 0, 1, 8, 0, 4, kByte}, 0, false},
-        {{5, 2, 1, 0, 0, 0, kByte}, 0, false},
-        {{0x10000, 0x10000, 1, 0, 0, 0x40000000, kFloat}, 0xffffffff, false},  // 2^64 bytes: 0 in 64 bits
-        {{0x80000000, 0x80000000, 1, 0, 0, 4, kByte}, 0xffffffff, false},      // 2^64 bytes, likewise
-        {{0x40000000, 0x8000, 1, 0x40000001, 0, 4, kFloat},
-         0x80000,
-         false},  // 2^19 more than fits: the low 32 bits are told
+        {uint64_t{204} * 108 * 16, {192, 108, 1, 204, 0, 4, kFloat}, true},
+        {uint64_t{100} * 108 * 16, {192, 108, 1, 100, 0, 4, kFloat}, true},
+        {30, {5, 2, 1, 0, 0, 3, kByte}, true},
+        {20, {5, 2, 7, 0, 123, 1, kHalf}, true},
+        {24, {0, 2, 1, 3, 0, 4, kByte}, true},
+        {0, {5, 2, 1, 0, 0, 4, 0}, false},
+        {0, {5, 2, 1, 0, 0, 4, 4}, false},
+        {0, {5, 0, 1, 8, 0, 4, kByte}, false},
+        {0, {5, 2, 1, 0, 0, 0, kByte}, false},
+        {0xffffffff, {0x10000, 0x10000, 1, 0, 0, 0x40000000, kFloat}, false},  // 2^64 bytes: 0 in 64 bits
+        {0xffffffff, {0x80000000, 0x80000000, 1, 0, 0, 4, kByte}, false},      // 2^64 bytes, likewise
+        {0x80000, {0x40000000, 0x8000, 1, 0x40000001, 0, 4, kFloat}, false},   // 2^49 + 2^19: the low 32 bits are told
     };
     const std::vector<std::byte> data(400000);
-    for (const auto& [desc, bytes, hasStorage] : rows) {
+    for (const auto& [bytes, desc, hasStorage] : rows) {
         const Handle image = newImage(desc);
         uint64_t told = 77;
         uint64_t size = 0;

@@ -56,7 +56,8 @@ TEST_F(PixelLayouts, AddressRowsByTheWidthAndWriteNothingBehindThem) {
     const Handle source = newImage(desc, input.encoded().data());
     const Handle destination = newImage(desc, before.encoded().data());
     ASSERT_EQ(execute(newFilter(kCopy), source, destination), TOV_SUCCESS);
-    std::copy(before.values.begin() + 7 * 5 * 3, before.values.end(), input.values.begin() + 7 * 5 * 3);
+    constexpr std::ptrdiff_t kWritten = 105;  // components of 7 x 5 pixels
+    std::copy(before.values.begin() + kWritten, before.values.end(), input.values.begin() + kWritten);
     EXPECT_EQ(maxDifference(read(destination, input), input), 0.0);
 }
 

@@ -11,7 +11,7 @@ constexpr tov_image_desc kDesc = {20, 9, 1, 0, 0, 4, TOV_COMPONENT_TYPE_FLOAT32}
 
 // A host that makes, runs and deletes everything, and goes on where a call fails; it runs once more after the failure.
 void runSession(uint32_t type, const std::string& call, uint32_t at) {
-    const std::vector<unsigned char> pixels(20 * 9 * 16, 1);
+    const std::vector<unsigned char> pixels(size_t{20} * 9 * 16, 1);
     void *context = nullptr, *image = nullptr, *filter = nullptr, *queue = nullptr, *mapped = nullptr;
     const auto expectKnown = [](int32_t code) {
         EXPECT_THAT(code, testing::AnyOf(TOV_SUCCESS, TOV_ERROR_INTERNAL_ERROR, TOV_ERROR_INVALID_CONTEXT));

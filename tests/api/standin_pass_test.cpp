@@ -54,10 +54,10 @@ constexpr char kPasses[] = R"(
 
 std::string definitionsOf(std::string options) {
     const std::pair<const char*, const char*> forms[] = {
-        {"-D (\\w+)_COMP_NUM=none -D \\1_COMP_TYPE=none -D \\1_Res=\\(int2\\)1\\b", "$1:-"},
-        {"-D (\\w+)_Res=\\(int2\\)\\(1007,5\\) -D \\1_COMP_NUM=4 -D \\1_COMP_TYPE=float\\b", "$1:S"},
-        {"-D (\\w+)_Res=\\(int2\\)\\(1007,5\\) -D \\1_COMP_NUM=3 -D \\1_COMP_TYPE=uint\\b", "$1:D"},
-        {"-D (\\w+)_Res=\\(int2\\)\\(1007,5\\) -D \\1_COMP_NUM=2 -D \\1_COMP_TYPE=half\\b", "$1:A"},
+        {R"(-D (\w+)_COMP_NUM=none -D \1_COMP_TYPE=none -D \1_Res=\(int2\)1\b)", "$1:-"},
+        {R"(-D (\w+)_Res=\(int2\)\(1007,5\) -D \1_COMP_NUM=4 -D \1_COMP_TYPE=float\b)", "$1:S"},
+        {R"(-D (\w+)_Res=\(int2\)\(1007,5\) -D \1_COMP_NUM=3 -D \1_COMP_TYPE=uint\b)", "$1:D"},
+        {R"(-D (\w+)_Res=\(int2\)\(1007,5\) -D \1_COMP_NUM=2 -D \1_COMP_TYPE=half\b)", "$1:A"},
     };
     for (const auto& [definitions, shortForm] : forms)
         options = std::regex_replace(options, std::regex(definitions), shortForm);
@@ -68,7 +68,7 @@ std::string textOf(const standin::Argument& argument) {
     const auto memory = argument.as<cl_mem>();
     if (argument.size == 48) return " M";
     size_t size = 0;
-    if (memory != nullptr && standin::state().live.count(memory) != 0) {
+    if (memory != nullptr && standin::state().live.contains(memory)) {
         const char mark = static_cast<char>(*standin::bytesOf(memory, &size));
         return mark >= 'A' ? std::string(" ") + mark : " #" + std::to_string(size);
     }
@@ -109,7 +109,7 @@ class Passes : public StandinTest {
         images_ = {auxiliary, auxiliary};
         tovImageFilterSetParameterImageArray(filter, "inputs", images_.data(), 2);
         for (const char* name : {"weights", "sigmas"})
-            tovImageFilterSetParameterFloatArray(filter, name, &floats_[0], 2);
+            tovImageFilterSetParameterFloatArray(filter, name, floats_.data(), 2);
         tovImageFilterSetParameter1u(filter, "inputsNum", 2);
         if (type != 19) tovImageFilterSetParameterImage(filter, "normalsImg", auxiliary);
         tovImageFilterSetParameterImage(filter, "positionsImg", auxiliary);
