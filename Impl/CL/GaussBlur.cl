@@ -252,14 +252,16 @@ __kernel void GaussBlurHorKernel(srcBufferType(srcBuffer), dst_float_4 dstBuffer
     const int2 size = GET_BUFFER_SIZE(dstBuffer);
 #if USE_TILE
     __local float4 tile[TILEWIDTH];
-    // A device that cannot run groups of 32 blurs without the tile; the choice is the same for all items.
-    if (get_local_size(0) == BLOCK_SIZE) {
-        const int count = size.x * size.y;
-        for (int i = (int)get_local_id(0); i < TILEWIDTH; i += BLOCK_SIZE) {
-            const int place = TilePlace(i, count);
-            tile[i] = ReadPixel(srcBuffer, place % size.x, place / size.x);
-        }
-        barrier(CLK_LOCAL_MEM_FENCE);
+    // A device that cannot run groups of 32 blurs without the tile. That choice is the same for all items, but the
+    // barrier stands outside of it: PoCL 3.1 runs a barrier under a condition wrong.
+    const bool is_tiled = get_local_size(0) == BLOCK_SIZE;
+    const int count = size.x * size.y;
+    for (int i = (int)get_local_id(0); is_tiled && i < TILEWIDTH; i += BLOCK_SIZE) {
+        const int place = TilePlace(i, count);
+        tile[i] = ReadPixel(srcBuffer, place % size.x, place / size.x);
+    }
+    barrier(CLK_LOCAL_MEM_FENCE);
+    if (is_tiled) {
         const int id = (int)get_global_id(0);
         if (id < count) {
             const float4 sum = SumOfTile(tile, id % size.x, size.x);
@@ -282,13 +284,14 @@ __kernel void GaussBlurVertKernel(src_float_4 srcBuffer, dstBufferType(dstBuffer
     const int2 size = GET_BUFFER_SIZE(dstBuffer);
 #if USE_TILE
     __local float4 tile[TILEWIDTH];
-    if (get_local_size(0) == BLOCK_SIZE) {
-        const int count = size.x * size.y;
-        for (int i = (int)get_local_id(0); i < TILEWIDTH; i += BLOCK_SIZE) {
-            const int place = TilePlace(i, count);
-            tile[i] = ReadPixel_float_4(srcBuffer, size, place / size.y, place % size.y);
-        }
-        barrier(CLK_LOCAL_MEM_FENCE);
+    const bool is_tiled = get_local_size(0) == BLOCK_SIZE;
+    const int count = size.x * size.y;
+    for (int i = (int)get_local_id(0); is_tiled && i < TILEWIDTH; i += BLOCK_SIZE) {
+        const int place = TilePlace(i, count);
+        tile[i] = ReadPixel_float_4(srcBuffer, size, place / size.y, place % size.y);
+    }
+    barrier(CLK_LOCAL_MEM_FENCE);
+    if (is_tiled) {
         const int id = (int)get_global_id(0);
         if (id < count) {
             const float4 sum = SumOfTile(tile, id % size.y, size.y);
