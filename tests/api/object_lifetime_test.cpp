@@ -53,9 +53,8 @@ TEST_F(ObjectLifetime, DeletedObjectsStayDeletedWhenTheirAddressIsInUseAgain) {
 
 TEST_F(ObjectLifetime, DeletedArrayElementsAndOptionalImagesGiveTheImageCode) {
     Handle gone = newImage(picture_);
-    const std::vector<tov_image> elements = {output_, gone};
-    const Handle product = newFilter(TOV_IMAGE_FILTER_MULTIPLY, {{"inputsNum", 2u}});
-    ASSERT_EQ(setParameter(product, {"inputs", elements}), TOV_SUCCESS);
+    const Parameters elements = {{"inputs", std::vector<tov_image>{output_, gone}}, {"inputsNum", 2u}};
+    const Handle product = newFilter(TOV_IMAGE_FILTER_MULTIPLY, elements);
     const Handle wavelets = newFilter(TOV_IMAGE_FILTER_EAW_DENOISE, {{"normalsImg", tov_image{gone}}});
     gone.remove();
     EXPECT_EQ(execute(product, input_, output_), TOV_ERROR_INVALID_IMAGE);
