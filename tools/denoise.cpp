@@ -23,7 +23,9 @@ namespace {
 
 using Names = std::span<const std::string_view>;
 
-// What common renderers call their other layers, the best suited first.
+// What common renderers call their layers, the best suited first. A picture that is denoised already is not.
+constexpr std::array<std::string_view, 4> kColorLayers = {"Noisy Image", kBeautyLayers[0], kBeautyLayers[1],
+                                                          kBeautyLayers[2]};
 constexpr std::array<std::string_view, 4> kAlbedoLayers = {"Denoising Albedo", "Albedo", "DiffCol", "diffuse_albedo"};
 constexpr std::array<std::string_view, 4> kNormalLayers = {"Denoising Normal", "Normal", "Normals", "N"};
 constexpr std::array<std::string_view, 3> kDepthLayers = {"Depth", "Z", "Denoising Depth"};
@@ -156,7 +158,7 @@ std::vector<float> takeAlpha(Picture& picture) {
 }  // namespace
 
 DenoiseInputs readDenoiseInputs(const std::string& input, const DenoiseOptions& options) {
-    DenoiseInputs inputs{.color = readFileOrLayer(input, kBeautyLayers)};
+    DenoiseInputs inputs{.color = readFileOrLayer(input, kColorLayers)};
     const PixelSize size = sizeOf(inputs.color);
     std::string found;
     inputs.albedo = readFeature(options.albedo, input, size, kAlbedoLayers, found);

@@ -10,8 +10,8 @@
 
 namespace tool {
 
-// What common renderers call the layer of the picture itself, in any letter case; the noisier first.
-inline constexpr std::array<std::string_view, 4> kBeautyLayers = {"Noisy Image", "Combined", "beauty", "rgba"};
+// What common renderers call the layer of the picture itself, in any letter case.
+inline constexpr std::array<std::string_view, 3> kBeautyLayers = {"Combined", "beauty", "rgba"};
 
 struct ChannelChoice {
     std::vector<int> indices;        // in the file: gray, gray and alpha, RGB or RGBA
