@@ -2,6 +2,7 @@
 #include <gmock/gmock.h>
 
 #include "kernelgen/fusion.h"
+#include "kernelgen/option_text.h"
 
 namespace {
 
@@ -60,6 +61,12 @@ TEST(Merging, GivesTheSpecifiedText) {
         "\ninline float4 Inner10(\n   srcBufferType(src10),\n   float k10,\n   int xidx, \n   int yidx)\n{\n"
         "\n    int2 coord;\n    coord = (int2)(xidx, yidx);\n    return result;\n}\n"
         "\n__kernel\nvoid Kernel(\n   int a,\n   srcBufferType(src10),\n   float k10,\n   int b)\n{\n\n    body;\n\n}");
+}
+
+TEST(SourceHash, NamesTheTextInTheOptionsAndTakesBytesAsSigned) {
+    EXPECT_EQ(HashSource("", 0), 294921u);
+    EXPECT_EQ(HashSource("abc", 3), 1307784515u);
+    EXPECT_EQ(HashSource("\xE9", 1), 785720697u);
 }
 
 }  // namespace
