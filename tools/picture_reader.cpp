@@ -96,7 +96,7 @@ void spreadPixel(const float* stored, const std::vector<int>& offsets, float* rg
 void readPixels(OIIO::ImageInput& input, int part, const std::string& path, const std::vector<int>& indices,
                 Picture& picture) {
     const auto [first, last] = std::ranges::minmax(indices);
-    const auto stride = static_cast<size_t>(last - first + 1);
+    const size_t stride = static_cast<size_t>(last) - static_cast<size_t>(first) + 1;
     std::vector<float> stored(picture.pixelCount() * stride);
     input.geterror();  // forget what opening left
     const bool read = input.read_image(part, 0, first, last + 1, OIIO::TypeDesc::FLOAT, stored.data());
