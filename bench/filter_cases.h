@@ -35,6 +35,7 @@ struct FilterCase {
     bool line = false;       // launches of 32 items in a line instead of groups of 8 x 8
     bool denoiser = false;   // measured at the smaller size only
     bool bytes = true;       // has a meaning for 8-bit pictures
+    uint32_t settling = 1;   // executions until it works as it then goes on
 };
 
 std::span<const FilterCase> filterCases();

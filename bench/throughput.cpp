@@ -71,7 +71,6 @@ struct Prepared {
     std::string name;
     std::unique_ptr<FilterRun> filter;
     std::unique_ptr<Copy> copy;
-    double firstSeconds = 0.0;  // the first execution, its compilation included
 };
 std::optional<Prepared> prepared;
 
@@ -81,7 +80,7 @@ Prepared& prepare(const std::string& name, const OpenCL& opencl, tov_context con
     prepared.reset();
     Prepared fresh{name, std::make_unique<FilterRun>(&opencl, context, what, layout),
                    std::make_unique<Copy>(opencl, what.line, layout)};
-    fresh.firstSeconds = secondsOf([&] { fresh.filter->execute(); });
+    for (uint32_t i = 0; i < what.settling; ++i) fresh.filter->execute();
     fresh.copy->run();
     prepared.emplace(std::move(fresh));
     return *prepared;
