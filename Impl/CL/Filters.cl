@@ -78,23 +78,12 @@ __kernel void GammaCorrectionKernel(srcBufferType(srcBuffer), dstBufferType(dstB
     WritePixel(dstBuffer, coord.x, coord.y, result);
 }
 
-// Contrast about middle gray, exposure in stops, then on request the filmic curve of K. Narkowicz, "ACES Filmic Tone
-// Mapping Curve" (2016).
 __kernel void SimpleToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cExposure,
                                       float cContrast, int cApplyToneMap) {
     int2 coord;
     GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
     const float4 color = ReadPixel(srcBuffer, coord.x, coord.y);
-    // Written so that a contrast of 1 adds an exact 0: dark pixels keep their last digits.
-    const float4 stretched = color * cContrast + 0.5f * (1.0f - cContrast);
-    float4 result = stretched * exp2(clamp(cExposure, -126.0f, 127.0f));
-    if (cApplyToneMap != 0) {
-        // The curve is above 1 from 7.3 on; the upper bound only keeps its squares finite.
-        const float4 bounded = clamp(result, 0.0f, 10000.0f);
-        const float4 numerator = bounded * (2.51f * bounded + 0.03f);
-        const float4 denominator = (2.43f * bounded + 0.59f) * bounded + 0.14f;
-        result = clamp(numerator / denominator, 0.0f, 1.0f);
-    }
+    float4 result = SimpleTone(LowerHalf(color), cExposure, cContrast, cApplyToneMap != 0).lo;
     result.w = 1.0f;
     WritePixel(dstBuffer, coord.x, coord.y, result);
 }
@@ -188,17 +177,9 @@ __kernel void GammaCorrectionKernel(srcBufferType(srcBuffer), dstBufferType(dstB
               right = GammaOf4(right, cGamma))
 }
 
-INLINED float16 FilmicCurve(float16 pixels) {
-    const float16 bounded = clamp(pixels, 0.0f, 10000.0f);
-    const float16 numerator = bounded * (2.51f * bounded + 0.03f);
-    const float16 denominator = (2.43f * bounded + 0.59f) * bounded + 0.14f;
-    return clamp(numerator / denominator, 0.0f, 1.0f);
-}
-
 INLINED float16 SimpleToneOf4(float16 pixels, float exposure, float contrast, bool curved) {
-    const float16 stretched = pixels * contrast + 0.5f * (1.0f - contrast);
-    const float16 exposed = stretched * exp2(clamp(exposure, -126.0f, 127.0f));
-    return Opaque(curved ? FilmicCurve(exposed) : exposed);
+    return Opaque((float16)(SimpleTone(pixels.lo, exposure, contrast, curved),
+                            SimpleTone(pixels.hi, exposure, contrast, curved)));
 }
 
 __kernel void SimpleToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cExposure,

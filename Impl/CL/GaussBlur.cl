@@ -22,6 +22,17 @@
 
 __constant float kCoefficients[TAPS] = COEFFS;
 
+// A coordinate outside 0 ... size - 1 reflected about the borders, the edge pixels repeated, until it is inside.
+static inline int MirrorCoordinate(int value, int size) {
+    if (value < 0 || value >= size) {
+        const int period = 2 * size;
+        value %= period;
+        value = value < 0 ? value + period : value;
+        value = value < size ? value : period - 1 - value;
+    }
+    return value;
+}
+
 // One pixel of the vertical pass, without a tile or a block.
 static inline float4 SumColumn(__global const float4* srcBuffer, int2 size, int column, int row) {
     float4 sum = (float4)(0.0f);

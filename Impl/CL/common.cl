@@ -11,13 +11,12 @@
 // elsewhere: a kernel may have a body for each.
 #if defined(__x86_64__) || defined(__i386__) || defined(__aarch64__) || defined(__arm__)
 #define ON_CENTRAL_PROCESSOR 1
+// Wide vectors are handed over between functions of one program only: how they would cross its border does not matter.
+#ifdef __clang__
+#pragma clang diagnostic ignored "-Wpsabi"
+#endif
 #else
 #define ON_CENTRAL_PROCESSOR 0
-#endif
-
-// Wide vectors are handed over between functions of one program only: how they would cross its border does not matter.
-#if ON_CENTRAL_PROCESSOR && defined(__clang__)
-#pragma clang diagnostic ignored "-Wpsabi"
 #endif
 
 // REPEAT(N, X) is X(0) X(1) ... X(N - 1).
@@ -101,17 +100,17 @@ typedef struct {
 
 // One-dimensional launches are built with GROUP_DIM_1D defined as 1, which selects GROUP_COORD_1 by pasting. In every
 // other program the name stands for itself.
-#define GROUP_COORD_1(limits)                           \
+#define GROUP_COORD_1(limits) \
     ((int2)((int)((uint)get_global_id(0) % (uint)(limits).x), (int)((uint)get_global_id(0) / (uint)(limits).x)))
 #define GROUP_COORD_GROUP_DIM_1D(limits) ((int2)((int)get_global_id(0), (int)get_global_id(1)))
 #define GROUP_COORD_(flag, limits) GROUP_COORD_##flag(limits)
 #define GROUP_COORD(flag, limits) GROUP_COORD_(flag, limits)
 
 // Sets coord to the work item's pixel; items outside the limits leave the kernel.
-#define GET_COORD(coord, limits)                                        \
-    coord = GROUP_COORD(GROUP_DIM_1D, limits);                          \
-    if (coord.x >= (limits).x || coord.y >= (limits).y) {               \
-        return;                                                         \
+#define GET_COORD(coord, limits)                          \
+    coord = GROUP_COORD(GROUP_DIM_1D, limits);            \
+    if (coord.x >= (limits).x || coord.y >= (limits).y) { \
+        return;                                           \
     }
 
 // ---- Reading -------------------------------------------------------------------------------------------------------
@@ -287,32 +286,8 @@ static inline bool IsUsable(float4 value) {
     return all(magnitude < (uint4)(0x58635fa9u)) != 0;
 }
 
-// RGB divided by alpha, or as it is where alpha is 0. Finite for usable pixels.
-static inline float3 DivideByAlpha(float4 rgba) {
-    const float divisor = rgba.w != 0.0f ? rgba.w : 1.0f;
-    return clamp(rgba.xyz / divisor, -1e15f, 1e15f);
-}
-
-// The vector scaled to length 1; a zero vector stays zero.
-static inline float3 Normalized(float3 value) {
-    return value * rsqrt(fmax(dot(value, value), 1e-36f));
-}
-
-// A coordinate outside 0 ... size - 1 reflected about the borders, the edge pixels repeated, until it is inside.
-static inline int MirrorCoordinate(int value, int size) {
-    if (value < 0 || value >= size) {
-        const int period = 2 * size;
-        value %= period;
-        value = value < 0 ? value + period : value;
-        value = value < size ? value : period - 1 - value;
-    }
-    return value;
-}
-
 // ---- Powers --------------------------------------------------------------------------------------------------------
-//
-// Eight at a time, as many as the vectors of central processors hold: two pixels, or one value of eight pixels. Others
-// drop the lanes that nobody reads.
+// Eight at a time, as many as the vectors of central processors hold; others drop the lanes that nobody reads.
 
 // log2(1 + f) / f and (2^f - 1) / f as minimax polynomials, from -0.3 to 0.42 and from -0.5 to 0.5; their relative
 // errors are 2e-7 and 1e-7.
@@ -418,22 +393,35 @@ static inline float8 ExposedFilm(float8 value, float exposure) {
 }
 
 // ---- Tone curves ---------------------------------------------------------------------------------------------------
-//
+
+// Contrast about middle gray, exposure in stops, then on request the filmic curve of K. Narkowicz, "ACES Filmic Tone
+// Mapping Curve" (2016). It is above 1 from 7.3 on; the upper bound only keeps its squares finite.
+static inline float8 SimpleTone(float8 value, float exposure, float contrast, bool curved) {
+    // Written so that a contrast of 1 adds an exact 0: dark pixels keep their last digits.
+    const float8 stretched = value * contrast + 0.5f * (1.0f - contrast);
+    const float8 exposed = stretched * exp2(clamp(exposure, -126.0f, 127.0f));
+    if (!curved) {
+        return exposed;
+    }
+    const float8 x = clamp(exposed, 0.0f, 10000.0f);
+    return clamp(x * (2.51f * x + 0.03f) / ((2.43f * x + 0.59f) * x + 0.14f), 0.0f, 1.0f);
+}
+
 // What a pixel's luminance asks its colour to be scaled by, for one luminance and for those of eight pixels.
 
 // With L = key * luminance the pixel is scaled by Ld / luminance, where Ld is L / (1 + L) mixed with L, or with a white
 // point w, L (1 + L / w^2) / (1 + L). Ld holds L as a factor, so the luminance cancels and black stays black. Both
 // curves are key * (constant + (1 - constant + slope * L) / (1 + L)). The bound on L keeps the products finite; the
 // curve is flat long before.
-#define DEFINE_REINHARD_SCALE(name, real)                                                                 \
-    static inline real name(real luminance, float key, float white_point, float burn) {                   \
-        const real lightness = clamp(key * luminance, -1e28f, 1e28f);                                     \
-        const real divisor = 1.0f + lightness;                                                            \
-        const real compression = divisor != 0.0f ? 1.0f / divisor : 0.0f;                                 \
-        const bool has_white = white_point >= 0.00001f;                                                   \
-        const float constant_part = has_white ? 0.0f : burn;                                              \
-        const float slope = has_white ? 1.0f / (white_point * white_point) : 0.0f;                        \
-        return key * (constant_part + (1.0f - constant_part + slope * lightness) * compression);          \
+#define DEFINE_REINHARD_SCALE(name, real)                                                        \
+    static inline real name(real luminance, float key, float white_point, float burn) {          \
+        const real lightness = clamp(key * luminance, -1e28f, 1e28f);                            \
+        const real divisor = 1.0f + lightness;                                                   \
+        const real compression = divisor != 0.0f ? 1.0f / divisor : 0.0f;                        \
+        const bool has_white = white_point >= 0.00001f;                                          \
+        const float constant_part = has_white ? 0.0f : burn;                                     \
+        const float slope = has_white ? 1.0f / (white_point * white_point) : 0.0f;               \
+        return key * (constant_part + (1.0f - constant_part + slope * lightness) * compression); \
     }
 DEFINE_REINHARD_SCALE(ReinhardScale, float)
 DEFINE_REINHARD_SCALE(ReinhardScaleOf8, float8)
@@ -484,9 +472,9 @@ static inline float4 CubicInterp(float4 p0, float4 p1, float4 p2, float4 p3, flo
         const float2 base = floor(position);                                                                        \
         const float2 f = position - base;                                                                           \
         const int2 last = bufferSize - 1;                                                                           \
-        const int2 nearest = convert_int2(clamp(base, -1.0f, convert_float2(bufferSize)));                             \
-        const int2 p = clamp(nearest, (int2)(0), last);                                                                \
-        const int2 q = clamp(nearest + 1, (int2)(0), last);                                                            \
+        const int2 nearest = convert_int2(clamp(base, -1.0f, convert_float2(bufferSize)));                          \
+        const int2 p = clamp(nearest, (int2)(0), last);                                                             \
+        const int2 q = clamp(nearest + 1, (int2)(0), last);                                                         \
         const float4 top = ReadPixel_##type##_4(buffer, bufferSize, p.x, p.y) * (1.0f - f.x) +                      \
                            ReadPixel_##type##_4(buffer, bufferSize, q.x, p.y) * f.x;                                \
         const float4 bottom = ReadPixel_##type##_4(buffer, bufferSize, p.x, q.y) * (1.0f - f.x) +                   \
