@@ -1,77 +1,91 @@
-// Small scenes for the denoisers: a noisy colour picture with features that have edges, slopes and textures.
+// Scenes for the denoisers and for accumulation, and how the filters run on them.
 #pragma once
+
+#include <gmock/gmock.h>
 
 #include "fixture.h"
 #include "vectors.h"
 
 namespace apitest {
 
-inline constexpr Layout kFloat1 = {1, TOV_COMPONENT_TYPE_FLOAT32};
+inline constexpr float kNaN = std::numeric_limits<float>::quiet_NaN();
+inline constexpr float kInfinity = std::numeric_limits<float>::infinity();
 
-// Any picture but the colour may be absent, which is empty.
+// Any picture but the colour may be absent, which is empty. Colour has alpha 1, normals have unit length.
 struct Scene {
-    Picture color;  // noisy, alpha 1
-    Picture normal, depth, transition;
-    Picture variance;  // of the noise, alpha 0
-    Picture normalVariance, depthVariance, transitionVariance;
+    Picture color, position, normal, depth, meshId, transition;
+    Picture variance, depthVariance, normalVariance, transitionVariance;
+    Matrix camera = {};
 };
 
-// A floor, a wall and a ball, checkered.
-inline Scene makeScene(uint32_t width, uint32_t height) {
+// A camera at (shift, 0, 0) that looks along y; width and height of the view are two metres at a distance of one.
+inline Matrix cameraAt(double shift, double turn = 0.0) {
+    const auto c = static_cast<float>(std::cos(turn));
+    const auto s = static_cast<float>(std::sin(turn));
+    const auto x = static_cast<float>(shift);
+    return {c, -s, 0, -c * x, 0, 0, 1, 0, 0, 0, 0, 1, s, c, 0, -s * x};
+}
+
+// A corrugated board 3 m away before the right half of a slanted wall, both checkered, seen from a camera under grain.
+inline Scene makeScene(uint32_t width, uint32_t height, double shift = 0.0, uint32_t seed = 1, double grain = 0.2) {
     Scene scene;
-    const auto onWall = [&](uint32_t y) { return 5 * y < 2 * height; };
+    const auto across = [&](uint32_t x) { return 2 * (x + 0.5) / width - 1; };
+    const auto onBoard = [&](uint32_t x) { return shift + 3 * across(x) > 0.6; };
+    scene.camera = cameraAt(shift);
+    scene.position = painted(width, height, kFloat4, [&](uint32_t x, uint32_t y) {
+        const double depth = onBoard(x) ? 3 : (4 + 0.3 * shift) / (1 - 0.3 * across(x));
+        return Rgba{shift + depth * across(x), depth, depth * (1 - 2 * (y + 0.5) / height), 1};
+    });
     scene.normal = painted(width, height, kFloat4, [&](uint32_t x, uint32_t y) {
-        const Rgba ball = {5 * (x + 0.5) / width - 3.5, 0, 2.5 - 5 * (y + 0.5) / height, 1};
-        const double inside = 1 - dot(ball, ball);
-        if (inside > 0) return ball + Rgba{0, std::sqrt(inside), 0, 0};
-        return onWall(y) ? Rgba{0, -1, 0, 1} : Rgba{0, 0, 1, 1};
+        const double turn = onBoard(x) ? 0.5 * std::sin(3 * scene.position.at(x, y)[2]) : 0;
+        return Rgba{std::sin(turn), -std::cos(turn), 0, 1};
     });
-    scene.depth = painted(width, height, kFloat1, [&](uint32_t x, uint32_t y) {
-        return Rgba{1, 1, 1, 1} * (onWall(y) ? 9 + 0.05 * x : 8 - 6.0 * y / height + 0.02 * x);
+    scene.depth = mapped(scene.position, kFloat1, [](const Rgba& p) { return gray(p[1]); });
+    scene.meshId = painted(width, height, kFloat1, [&](uint32_t x, uint32_t) { return gray(onBoard(x) ? 7 : 3); });
+    scene.transition = mapped(scene.position, kFloat4, [](const Rgba& p) {
+        return std::sin(2 * p[0]) * std::sin(2 * p[2]) > 0 ? Rgba{0.8, 0.7, 0.6, 1} : Rgba{0.2, 0.25, 0.3, 1};
     });
-    scene.transition = painted(width, height, kFloat4, [&](uint32_t x, uint32_t y) {
-        return (x / 5 + y / 5) % 2 == 0 ? Rgba{0.8, 0.7, 0.6, 1} : Rgba{0.2, 0.25, 0.3, 1};
-    });
-    const Picture grain = noise(width, height, kFloat4, 0.3, 7);
+    const Picture noisy = noise(width, height, kFloat4, 2 * grain, seed);
     scene.color = painted(width, height, kFloat4, [&](uint32_t x, uint32_t y) {
-        const double light = 0.3 + 0.7 * std::abs(scene.normal.at(x, y)[2]);
-        const Rgba c = scene.transition.at(x, y) * light + grain.at(x, y) - Rgba{0.15, 0.15, 0.15, 0};
-        return Rgba{std::max(c[0], 0.0), std::max(c[1], 0.0), std::max(c[2], 0.0), 1};
+        const double light = 0.2 - 0.4 * scene.normal.at(x, y)[1];
+        const Rgba c = scene.transition.at(x, y) * light + noisy.at(x, y);
+        return Rgba{c[0], c[1], c[2], 1};
     });
     scene.variance = painted(width, height, kFloat4, [&](uint32_t x, uint32_t) {
-        return Rgba{1, 0.9, 1.1, 0} * (0.15 * 0.15 / 3 * (0.75 + 0.5 * x / width));
+        return Rgba{1, 0.9, 1.1, 0} * (grain * grain / 3 * (0.75 + 0.5 * x / width));
     });
     return scene;
 }
 
-inline Picture scaled(const Picture& picture, double factor) {
-    return mapped(picture, picture.layout, [&](const Rgba& c) { return c * factor; });
-}
-
-inline void fillPixel(Picture& picture, uint32_t x, uint32_t y, float value) {
-    const uint32_t components = picture.layout.components;
-    std::fill_n(&picture.values[(size_t{y} * picture.width + x) * components], components, value);
-}
-
-inline constexpr float kNaN = std::numeric_limits<float>::quiet_NaN();
-inline constexpr float kInfinity = std::numeric_limits<float>::infinity();
-
 class SceneTest : public DeviceTest {
  protected:
-    // Runs with those of the pictures bound that are present.
-    static Picture runWith(uint32_t type, const Picture& color, Parameters parameters,
-                           std::initializer_list<std::pair<const char*, const Picture*>> pictures) {
+    // Binds what is present of the scene and known to the filter, and keeps the results.
+    int32_t execute(tov_image_filter filter, const Scene& scene) {
+        const std::pair<const char*, const Picture*> pictures[] = {{"positionsImg", &scene.position},
+                                                                   {"normalsImg", &scene.normal},
+                                                                   {"depthImg", &scene.depth},
+                                                                   {"meshIdsImg", &scene.meshId},
+                                                                   {"transImg", &scene.transition},
+                                                                   {"colorVar", &scene.variance},
+                                                                   {"vColorImg", &scene.variance},
+                                                                   {"vDepthImg", &scene.depthVariance},
+                                                                   {"vNormalsImg", &scene.normalVariance},
+                                                                   {"vTransImg", &scene.transitionVariance}};
+        const Handle output = newImage(scene.color);
+        const Handle variance = newImage(Picture(scene.color.width, scene.color.height));
         std::vector<Handle> images;
         for (const auto& [name, picture] : pictures)
             if (!picture->values.empty())
-                parameters.push_back({name, tov_image{images.emplace_back(newImage(*picture))}});
-        return run(type, color, parameters);
+                setParameter(filter, {name, tov_image{images.emplace_back(newImage(*picture))}});
+        setParameter(filter, {"outVarianceImg", tov_image{variance}});
+        setParameter(filter, {"viewProjMatrix", scene.camera});
+        const int32_t code = DeviceTest::execute(filter, newImage(scene.color), output);
+        color_ = read(output, scene.color);
+        variance_ = read(variance, scene.color);
+        return code;
     }
-    // All finite and nothing darker than the darkest usable pixel: unusable ones spread neither as NaN nor as black.
-    static void expectFilled(const Picture& result, double darkest) {
-        EXPECT_TRUE(isFinite(result));
-        EXPECT_GE(*std::min_element(result.values.begin(), result.values.end()), darkest);
-    }
+
+    Picture color_, variance_;  // what the last execution gave
 };
 
 }  // namespace apitest

@@ -1,6 +1,4 @@
 // Morphological antialiasing against its three passes in double.
-#include <gmock/gmock.h>
-
 #include "area_rule.h"
 #include "fixture.h"
 #include "vectors.h"
@@ -8,8 +6,6 @@
 namespace {
 
 using namespace apitest;
-
-constexpr Layout kFloat1 = {1, TOV_COMPONENT_TYPE_FLOAT32};
 
 struct Features {
     Picture mesh, normals, depth;  // empty where absent
@@ -36,21 +32,18 @@ Picture edgesOf(const Picture& color, const Features& features) {
 
 // Areas beside the line of upper (own = 1) or left (own = 0) edges through a pixel.
 std::array<int, 2> areasAt(const Picture& edges, uint32_t x, uint32_t y, size_t own) {
-    if (edges.at(x, y)[own] == 0.0) return {};
-    const auto sample = [&](double along, double across, size_t channel) {
-        return own == 1 ? bilinear(edges, x + along, y + across)[channel]
-                        : bilinear(edges, x + across, y + along)[channel];
+    if (x >= edges.width || y >= edges.height || edges.at(x, y)[own] == 0.0) return {};
+    const auto sample = [&](double along, double across) {
+        return own == 1 ? bilinear(edges, x + along, y + across) : bilinear(edges, x + across, y + along);
     };
-    const auto distanceToEnd = [&](double direction) {
+    const auto distanceToEnd = [&](int direction) {
         for (int i = 0; i < 15; ++i) {
-            const double last = sample(direction * (1.5 + 2.0 * i), 0.0, own);
+            const double last = sample(direction * (1.5 + 2.0 * i), 0.0)[own];
             if (last < 0.9) return static_cast<int>(std::lround(2 * i + 2 * last));
         }
         return 30;
     };
-    const auto crossing = [&](double along) {
-        return static_cast<int>(std::lround(4 * sample(along, -0.25, 1 - own)));
-    };
+    const auto crossing = [&](int along) { return static_cast<int>(std::lround(4 * sample(along, -0.25)[1 - own])); };
     const int first = distanceToEnd(-1);
     const int second = distanceToEnd(1);
     return areaRule(first, second, crossing(-first), crossing(second + 1));
@@ -58,11 +51,11 @@ std::array<int, 2> areasAt(const Picture& edges, uint32_t x, uint32_t y, size_t 
 
 Picture antialiased(const Picture& color, const Features& features) {
     const Picture edges = edgesOf(color, features);
-    const auto weight = [&](uint32_t x, uint32_t y, size_t own, size_t side) {
-        return x < color.width && y < color.height ? areasAt(edges, x, y, own)[side] / 255.0 : 0.0;
+    const auto area = [&](uint32_t x, uint32_t y, size_t own, size_t side) {
+        return areasAt(edges, x, y, own)[side] / 255.0;
     };
     return painted(color.width, color.height, color.layout, [&](uint32_t x, uint32_t y) {
-        const double a[] = {weight(x, y, 1, 0), weight(x, y + 1, 1, 1), weight(x, y, 0, 0), weight(x + 1, y, 0, 1)};
+        const double a[] = {area(x, y, 1, 0), area(x, y + 1, 1, 1), area(x, y, 0, 0), area(x + 1, y, 0, 1)};
         const Rgba sides[] = {bilinear(color, x, y - a[0]), bilinear(color, x, y + a[1]), bilinear(color, x - a[2], y),
                               bilinear(color, x + a[3], y)};
         Rgba result{};
@@ -75,20 +68,18 @@ Picture antialiased(const Picture& color, const Features& features) {
     });
 }
 
+// Blocks of two values, so that edges cross and meet in every way.
+Picture blocks(uint32_t width, uint32_t height, Layout layout = kFloat4) {
+    const Picture random = noise(width, height, kFloat1, 1.0, 3);
+    return painted(width, height, layout,
+                   [&](uint32_t x, uint32_t y) { return gray(std::round(random.at(x / 3 * 3, y / 2 * 2)[0])); });
+}
+
 // Two tones beside slanted lines, with long steps of all lengths in both directions.
 Picture slanted(uint32_t width, uint32_t height, Layout layout = kFloat4) {
     return painted(width, height, layout, [](uint32_t x, uint32_t y) {
         const double tone = (7 * y > x + 20) != (9 * x > y + 300) ? 0.75 : 0.25;
         return Rgba{tone, 0.5 * tone, 0.25, 9 * x > y + 300 ? 1.0 : 0.5};
-    });
-}
-
-// Blocks of two values, so that edges cross and meet in every way.
-Picture blocks(uint32_t width, uint32_t height, Layout layout = kFloat4) {
-    const Picture random = noise(width, height, kFloat1, 1.0, 3);
-    return painted(width, height, layout, [&](uint32_t x, uint32_t y) {
-        const double value = random.at(x / 3 * 3, y / 2 * 2)[0] < 0.5 ? 0.0 : 1.0;
-        return Rgba{value, value, value, 1.0};
     });
 }
 
@@ -114,30 +105,23 @@ TEST_F(Antialiasing, FeaturesFindEdgesThatTheColourHides) {
     features.normals = painted(45, 30, {3, TOV_COMPONENT_TYPE_FLOAT32}, [](uint32_t x, uint32_t y) {
         return 3 * y > x ? Rgba{0, 0, 1, 0} : x > 40 ? Rgba{} : Rgba{0, 2, 1, 0};
     });
-    features.depth = painted(45, 30, kFloat1, [](uint32_t x, uint32_t y) {
-        return Rgba{1, 1, 1, 1} * (x > 5 * y ? 1.0 : 1.5);
-    });
-    const Handle mesh = newImage(features.mesh);
-    const Handle normals = newImage(features.normals);
-    const Handle depth = newImage(features.depth);
-    const Parameters all = {
-        {"meshIDImg", tov_image{mesh}}, {"normalsImg", tov_image{normals}}, {"depthImg", tov_image{depth}}};
-    EXPECT_LT(maxDifference(run(TOV_IMAGE_FILTER_MLAA, color, all), antialiased(color, features)), 2e-6);
+    features.depth = painted(45, 30, kFloat1, [](uint32_t x, uint32_t y) { return gray(x > 5 * y ? 1.0 : 1.5); });
+    const Picture result = run(TOV_IMAGE_FILTER_MLAA, color,
+                               {{"meshIDImg", tov_image{newImage(features.mesh)}},
+                                {"normalsImg", tov_image{newImage(features.normals)}},
+                                {"depthImg", tov_image{newImage(features.depth)}}});
+    EXPECT_LT(maxDifference(result, antialiased(color, features)), 2e-6);
     EXPECT_EQ(maxDifference(run(TOV_IMAGE_FILTER_MLAA, color), color), 0.0) << "without them there is no edge";
 }
 
-TEST_F(Antialiasing, OtherLayoutsAndClaimedSizesAreRefusedWithALine) {
-    for (const Layout layout : {kByte4, kFloat4}) {
-        const Handle input = newImage(noise(4, 4, layout));
-        const Handle output = newImage(noise(4, 4));
-        const Handle filter = newFilter(TOV_IMAGE_FILTER_MLAA);
-        const Handle queue = newQueue();
-        const bool claims = layout == kFloat4;
-        ASSERT_EQ(tovCommandQueueAttachImageFilter(queue, filter, input, output), TOV_SUCCESS);
-        ASSERT_EQ(tovImageFilterSetParameter2u(filter, "srcRec", claims ? 4000 : 4, 4), TOV_SUCCESS);
-        int32_t code = TOV_SUCCESS;
-        const auto execute = [&] { code = tovContextExecuteCommandQueue(context(), queue, nullptr, nullptr); };
-        EXPECT_THAT(printedBy(execute), testing::HasSubstr(claims ? "srcRec" : "four components"));
-        EXPECT_EQ(code, claims ? TOV_ERROR_INVALID_PARAMETER : TOV_ERROR_INTERNAL_ERROR);
-    }
+TEST_F(Antialiasing, OtherLayoutsAndClaimedSizesAreRefused) {
+    const Handle bytes = newImage(noise(4, 4, kByte4));
+    const Handle input = newImage(noise(4, 4));
+    const Handle output = newImage(noise(4, 4));
+    const Handle filter = newFilter(TOV_IMAGE_FILTER_MLAA);
+    const Handle queue = newQueue();
+    EXPECT_EQ(execute(filter, bytes, output), TOV_ERROR_INTERNAL_ERROR);
+    ASSERT_EQ(tovCommandQueueAttachImageFilter(queue, filter, input, output), TOV_SUCCESS);
+    ASSERT_EQ(tovImageFilterSetParameter2u(filter, "srcRec", 4000, 4), TOV_SUCCESS);
+    EXPECT_EQ(tovContextExecuteCommandQueue(context(), queue, nullptr, nullptr), TOV_ERROR_INVALID_PARAMETER);
 }

@@ -12,16 +12,16 @@ int64_t mirrored(int64_t place, int64_t size) {
     return place;
 }
 
-// Along x for (dx, dy) = (1, 0), along y for (0, 1).
-Picture blurredAlong(const Picture& input, Layout layout, int radius, double sigma, int dx, int dy) {
-    return painted(input.width, input.height, layout, [&](int64_t x, int64_t y) {
+Picture blurred(const Picture& input, int radius, double sigma) {
+    return painted(input.width, input.height, input.layout, [&](int64_t x, int64_t y) {
         Rgba sum{};
         double weights = 0.0;
-        for (int i = -radius; i <= radius; ++i) {
-            const double weight = std::exp(-i * i / (2 * sigma * sigma));
-            sum = sum + nearest(input, mirrored(x + i * dx, input.width), mirrored(y + i * dy, input.height)) * weight;
-            weights += weight;
-        }
+        for (int j = -radius; j <= radius; ++j)
+            for (int i = -radius; i <= radius; ++i) {
+                const double weight = std::exp(-(i * i + j * j) / (2 * sigma * sigma));
+                sum = sum + nearest(input, mirrored(x + i, input.width), mirrored(y + j, input.height)) * weight;
+                weights += weight;
+            }
         return sum * (1 / weights);
     });
 }
@@ -30,7 +30,7 @@ using GaussianBlur = DeviceTest;
 
 }  // namespace
 
-TEST_F(GaussianBlur, PlainAndTiledMatchASeparableSumForAllSizesRadiiAndLayouts) {
+TEST_F(GaussianBlur, PlainAndTiledMatchASumOverTheWindowForAllSizesRadiiAndLayoutsAndKeepNaNWithinIt) {
     // Coefficients have six digits after the point, a byte may round to its neighbour, a half has eleven digits.
     const struct {
         uint32_t width, height, radius;
@@ -45,25 +45,14 @@ TEST_F(GaussianBlur, PlainAndTiledMatchASeparableSumForAllSizesRadiiAndLayouts) 
                  {45, 14, 4, 2.0f, {3, TOV_COMPONENT_TYPE_UINT8}, 1.0},
                  {45, 14, 4, 2.0f, {4, TOV_COMPONENT_TYPE_FLOAT16}, 1.0 / 1024}};
     for (const auto& [width, height, radius, sigma, layout, tolerance] : cases) {
-        const Picture input = noise(width, height, layout);
+        Picture input = noise(width, height, layout);
+        if (radius == 3) input.set(20, 10, gray(std::nan("")));
         const int reach = std::min(static_cast<int>(radius), 60);  // farther weights have no digit left
-        const Picture rows = blurredAlong(input, kFloat4, reach, double{sigma}, 1, 0);
-        const Picture expected = blurredAlong(rows, layout, reach, double{sigma}, 0, 1);
-        for (const uint32_t tiling : {0u, 1u})
-            EXPECT_LE(maxDifference(run(TOV_IMAGE_FILTER_GAUSSIAN_BLUR, input,
-                                        {{"radius", radius}, {"sigma", sigma}, {"tiling", tiling}}),
-                                    expected),
-                      tolerance)
+        const Picture expected = blurred(input, reach, double{sigma});
+        for (const uint32_t tiling : {0u, 1u}) {
+            const Parameters parameters = {{"radius", radius}, {"sigma", sigma}, {"tiling", tiling}};
+            EXPECT_LE(maxDifference(run(TOV_IMAGE_FILTER_GAUSSIAN_BLUR, input, parameters), expected), tolerance)
                 << width << " x " << height << ", radius " << radius << ", tiling " << tiling;
+        }
     }
-}
-
-TEST_F(GaussianBlur, NotANumberStaysWithinTheRadius) {
-    Picture input = noise(40, 20);
-    input.set(20, 10, Rgba{1, 1, 1, 1} * std::nan(""));
-    const Picture output = run(TOV_IMAGE_FILTER_GAUSSIAN_BLUR, input, {{"radius", 3u}, {"sigma", 1.0f}});
-    for (int y = 0; y < 20; ++y)
-        for (int x = 0; x < 40; ++x)
-            EXPECT_EQ(std::isnan(nearest(output, x, y)[0]), std::abs(x - 20) <= 3 && std::abs(y - 10) <= 3)
-                << x << ", " << y;
 }

@@ -1,6 +1,4 @@
 // Resampling against its three formulas in double.
-#include <gmock/gmock.h>
-
 #include "fixture.h"
 #include "vectors.h"
 
@@ -73,29 +71,23 @@ TEST_F(Resampling, AllOperatorsMatchTheirFormulasForLargerAndSmallerPictures) {
 
 // Whatever sizes the host claims, all reads and writes stay inside the images.
 TEST_F(Resampling, ClaimedSizesNeverLeadOutsideTheImages) {
-    const Handle input = newImage(painted(6, 5, kFloat4, [](uint32_t, uint32_t) { return Rgba{0.5, 0.5, 0.5, 0.5}; }));
+    const Handle input = newImage(painted(6, 5, kFloat4, [](uint32_t, uint32_t) { return gray(0.5); }));
     for (const auto& [name, width, height] :
-         {std::tuple{"srcRec", 4000u, 3u}, std::tuple{"srcRec", 4000000000u, 4000000000u},
-          std::tuple{"dstRec", 5000u, 2u}}) {
+         {std::tuple{"srcRec", 4000u, 3u}, {"srcRec", 4000000000u, 4000000000u}, {"dstRec", 5000u, 2u}})
         for (const uint32_t operation : {0u, 1u, 2u}) {
-            const Picture like(4, 4);
-            const Handle output = newImage(like);
+            const Handle output = newImage(Picture(4, 4));
             const Handle filter = newFilter(TOV_IMAGE_FILTER_RESAMPLE, {{"interpOperator", operation}});
             const Handle queue = newQueue();
             ASSERT_EQ(tovCommandQueueAttachImageFilter(queue, filter, input, output), TOV_SUCCESS);
             ASSERT_EQ(tovImageFilterSetParameter2u(filter, name, width, height), TOV_SUCCESS);
             EXPECT_EQ(tovContextExecuteCommandQueue(context(), queue, nullptr, nullptr), TOV_SUCCESS);
-            for (const float value : read(output, like).values)
+            for (const float value : read(output, Picture(4, 4)).values)
                 EXPECT_TRUE(value == 0.0f || value == 1.0f || std::abs(value - 0.5f) < 1e-6f)
                     << value << " with " << name << " " << width << ", operator " << operation;
         }
-    }
 }
 
-TEST_F(Resampling, AnUnknownOperatorIsRefusedWithALine) {
-    const Handle image = newImage(noise(4, 4));
-    const Handle output = newImage(noise(3, 3));
+TEST_F(Resampling, AnUnknownOperatorIsRefused) {
     const Handle filter = newFilter(TOV_IMAGE_FILTER_RESAMPLE, {{"interpOperator", 3u}});
-    const auto refused = [&] { EXPECT_EQ(execute(filter, image, output), TOV_ERROR_INVALID_PARAMETER); };
-    EXPECT_THAT(printedBy(refused), testing::HasSubstr("interpOperator is 3"));
+    EXPECT_EQ(execute(filter, newImage(noise(4, 4)), newImage(noise(3, 3))), TOV_ERROR_INVALID_PARAMETER);
 }
