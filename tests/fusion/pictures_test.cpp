@@ -109,30 +109,22 @@ TEST_F(FusedPictures, OfTriplesAndLongChainsEqualThoseOfTheirFiltersInSeveralLay
     expectEqual({kFusable.begin() + 6, kFusable.end()});
 }
 
-TEST_F(FusedPictures, OfArraysMixFiltersImagesAndAbsentOnes) {
-    const Handle twice = newFilter(TOV_IMAGE_FILTER_LINEAR_TONEMAP, {{"cKey", 2.0f}, {"srcBuffer", image_}});
-    const Handle thrice = newFilter(TOV_IMAGE_FILTER_LINEAR_TONEMAP, {{"cKey", 3.0f}, {"srcBuffer", image_}});
-    const Parameters four = {{"inputs", std::vector<tov_image>{twice, image_, nullptr, thrice}},
-                             {"weights", std::vector<float>{1.0f, 0.5f, 100.0f, 0.25f}},
-                             {"inputsNum", 4u}};
-    expectResult(newFilter(TOV_IMAGE_FILTER_WEIGHTED_SUM, four), image_, mapped(picture_, kFloat4, [](const Rgba& p) {
-                     return Rgba{p[0] * 3.25, p[1] * 3.25, p[2] * 3.25, p[3] * 1.75};  // alpha is not made brighter
-                 }));
-}
-
-TEST_F(FusedPictures, OfAProductOfTwoProductsTellTheirKernelsApart) {
+TEST_F(FusedPictures, OfAProductOfTwoSumsMixFiltersImagesAndGapsAndTellTheirKernelsApart) {
     const Handle half = newFilter(TOV_IMAGE_FILTER_LINEAR_TONEMAP, {{"cKey", 0.5f}, {"srcBuffer", image_}});
-    const auto productOf = [&](tov_image a, tov_image b) {
-        return Parameters{{"srcBuffer", image_}, {"inputs", std::vector<tov_image>{a, b}}, {"inputsNum", 2u}};
+    const auto sumOf = [&](tov_image a, tov_image b) {
+        return Parameters{{"srcBuffer", image_},
+                          {"inputs", std::vector{a, b, tov_image{}}},
+                          {"weights", std::vector<float>{1.0f, 0.25f, 100.0f}},
+                          {"inputsNum", 3u}};
     };
-    const Parameters left = productOf(image_, half);   // Its second input and the first of the other product would
-    const Parameters right = productOf(half, image_);  // both be kernel 21.
-    const Handle first = newFilter(TOV_IMAGE_FILTER_MULTIPLY, left);
-    const Handle second = newFilter(TOV_IMAGE_FILTER_MULTIPLY, right);
-    const Parameters both = productOf(first, second);
+    const Parameters left = sumOf(image_, half);   // Its second input and the first of the other sum would both be
+    const Parameters right = sumOf(half, image_);  // kernel 21.
+    const Handle first = newFilter(TOV_IMAGE_FILTER_WEIGHTED_SUM, left);
+    const Handle second = newFilter(TOV_IMAGE_FILTER_WEIGHTED_SUM, right);
+    const Parameters both = {{"inputs", std::vector<tov_image>{first, second}}, {"inputsNum", 2u}};
     expectResult(newFilter(TOV_IMAGE_FILTER_MULTIPLY, both), image_, mapped(picture_, kFloat4, [](const Rgba& p) {
-                     const auto fourth = [](double v) { return v * v * v * v; };
-                     return Rgba{fourth(p[0]) / 4, fourth(p[1]) / 4, fourth(p[2]) / 4, fourth(p[3])};
+                     const auto product = [](double v) { return 1.125 * v * 0.75 * v; };
+                     return Rgba{product(p[0]), product(p[1]), product(p[2]), 1.25 * 1.25 * p[3] * p[3]};
                  }));
 }
 
@@ -163,11 +155,11 @@ TEST_F(FusedPictures, FollowTheCameraOfAnInnerMotionFilter) {
     const Handle inner = newFilter(TOV_IMAGE_FILTER_MOTION_BUFFER, {{"srcBuffer", image_}});
     const Handle outer = newFilter(TOV_IMAGE_FILTER_LINEAR_TONEMAP);
     const Handle expected = newImage(picture_.desc());
-    for (int frame = 0; frame < 3; ++frame) {
+    for (const float shift : {0.0f, 0.25f, 0.5f}) {
         Matrix camera = kCamera;
-        camera[3] += 0.25f * static_cast<float>(frame);
-        for (tov_image_filter filter : {tov_object{alone}, tov_object{inner}})
-            ASSERT_EQ(setParameter(filter, {"viewProjMatrix", camera}), TOV_SUCCESS);
+        camera[3] += shift;
+        setParameter(alone, {"viewProjMatrix", camera});
+        setParameter(inner, {"viewProjMatrix", camera});
         ASSERT_EQ(execute(alone, image_, expected), TOV_SUCCESS);
         expectResult(outer, inner, read(expected, picture_));
     }
@@ -175,17 +167,17 @@ TEST_F(FusedPictures, FollowTheCameraOfAnInnerMotionFilter) {
 
 TEST_F(FusedPictures, ComeFromTheCacheUnlessTheSharedTextOnDiskIsNewer) {
     const fs::path before = fs::current_path();
-    const fs::path root = cacheDirectory() / "fusion";
-    fs::create_directories(root / "work");
-    fs::current_path(root / "work");
-    // A run in a context of its own, which has no kernels in memory yet.
-    const auto compiles = [&] {
+    const fs::path text = cacheDirectory() / "Tovkit/Impl/CL/common.cl";
+    fs::create_directories(text.parent_path());
+    fs::create_directories(cacheDirectory() / "work");
+    fs::current_path(cacheDirectory() / "work");
+    const auto compiles = [&] {  // in a context of its own, which has no kernels in memory yet
         const Handle owner = newContext();
         const Handle image = newImage(picture_, owner);
-        const Handle inner =
-            newFilter(TOV_IMAGE_FILTER_LINEAR_TONEMAP, {{"cKey", 1.25f}, {"srcBuffer", tov_image{image}}}, owner);
-        const Handle outer = newFilter(TOV_IMAGE_FILTER_NORMALIZATION, {}, owner);
         const Handle result = newImage(picture_, owner);
+        const Parameters parameters = {{"cKey", 1.25f}, {"srcBuffer", tov_image{image}}};
+        const Handle inner = newFilter(TOV_IMAGE_FILTER_LINEAR_TONEMAP, parameters, owner);
+        const Handle outer = newFilter(TOV_IMAGE_FILTER_NORMALIZATION, {}, owner);
         const Handle queue = newQueue(owner);
         EXPECT_EQ(tovCommandQueueAttachImageFilter(queue, outer, inner, result), TOV_SUCCESS);
         const auto execute = [&] { EXPECT_EQ(tovContextExecuteCommandQueue(owner, queue, nullptr, nullptr), 0); };
@@ -193,9 +185,8 @@ TEST_F(FusedPictures, ComeFromTheCacheUnlessTheSharedTextOnDiskIsNewer) {
     };
     compiles();
     EXPECT_FALSE(compiles());
-    fs::create_directories(root / "Tovkit/Impl/CL");
-    fs::copy_file(TOV_COMMON_KERNEL_TEXT, root / "Tovkit/Impl/CL/common.cl");
-    fs::last_write_time(root / "Tovkit/Impl/CL/common.cl", fs::file_time_type::clock::now() + std::chrono::hours(1));
+    fs::copy_file(TOV_COMMON_KERNEL_TEXT, text);
+    fs::last_write_time(text, fs::file_time_type::clock::now() + std::chrono::hours(1));
     EXPECT_TRUE(compiles());
     fs::current_path(before);
 }

@@ -1,5 +1,5 @@
 // What cannot be fused, and what a tree's objects must be when it runs.
-#include <functional>
+#include <cmath>
 
 #include "fixture.h"
 
@@ -14,7 +14,7 @@ class FusionRefusals : public DeviceTest {
     const tov_image image_ = handle_;
 };
 
-TEST_F(FusionRefusals, NameFiltersWithSeveralPassesMemoryOrWindows) {
+TEST_F(FusionRefusals, CoverFiltersWithSeveralPassesMemoryOrWindowsBeforeAnythingIsBuilt) {
     for (const uint32_t type :
          {TOV_IMAGE_FILTER_MATH_TEST, TOV_IMAGE_FILTER_GAUSSIAN_BLUR, TOV_IMAGE_FILTER_BILATERAL_DENOISE,
           TOV_IMAGE_FILTER_LWR_DENOISE, TOV_IMAGE_FILTER_EAW_DENOISE, TOV_IMAGE_FILTER_MLAA,
@@ -27,8 +27,7 @@ TEST_F(FusionRefusals, NameFiltersWithSeveralPassesMemoryOrWindows) {
             ASSERT_EQ(setParameter(whole, {"srcBuffer", image_}), TOV_SUCCESS);
             EXPECT_EQ(execute(single, whole, result_), TOV_ERROR_UNSUPPORTED) << type;
         });
-        EXPECT_NE(printed.find("Cannot fuse filters: "), std::string::npos) << type;
-        EXPECT_EQ(printed.find("Cached file"), std::string::npos) << "nothing may be built, type " << type;
+        EXPECT_EQ(printed.find("Cached file"), std::string::npos) << type;
     }
 }
 
@@ -41,18 +40,12 @@ TEST_F(FusionRefusals, EndWhenTheFilterIsReplacedByAnImage) {
     EXPECT_EQ(maxDifference(read(result_, picture_), run(TOV_IMAGE_FILTER_GAUSSIAN_BLUR, picture_, parameters)), 0);
 }
 
-TEST_F(FusionRefusals, CoverCircles) {
-    const Handle a = newFilter(TOV_IMAGE_FILTER_LINEAR_TONEMAP);
-    const Handle b = newFilter(TOV_IMAGE_FILTER_NORMALIZATION, {{"srcBuffer", tov_image{a}}});
-    EXPECT_EQ(setParameter(a, {"srcBuffer", tov_image{a}}), TOV_ERROR_INVALID_PARAMETER);
-    EXPECT_EQ(setParameter(a, {"srcBuffer", tov_image{b}}), TOV_ERROR_INVALID_PARAMETER);
-
-    // The array is the caller's: a circle may arise after it was set.
-    const Handle product = newFilter(TOV_IMAGE_FILTER_MULTIPLY, {{"inputsNum", 1u}});
+TEST_F(FusionRefusals, CoverACircleThatArisesInTheCallersArray) {
     tov_image input = image_;
+    const Handle product = newFilter(TOV_IMAGE_FILTER_MULTIPLY, {{"inputsNum", 1u}});
     ASSERT_EQ(tovImageFilterSetParameterImageArray(product, "inputs", &input, 1), TOV_SUCCESS);
-    ASSERT_EQ(setParameter(a, {"srcBuffer", tov_image{product}}), TOV_SUCCESS);
-    input = a;
+    const Handle linear = newFilter(TOV_IMAGE_FILTER_LINEAR_TONEMAP, {{"srcBuffer", tov_image{product}}});
+    input = linear;
     EXPECT_EQ(execute(product, image_, result_), TOV_ERROR_UNSUPPORTED);
 }
 
@@ -70,34 +63,23 @@ TEST_F(FusionRefusals, CoverTreesOfMoreThan256PassesOr64Arguments) {
     EXPECT_EQ(execute(filters[3], image_, result_), TOV_SUCCESS);
 }
 
-TEST_F(FusionRefusals, GiveTheCodeOfWhatIsDeletedOrDoesNotFit) {
-    const struct {
-        const char* what;
-        std::function<void(Handle& inner, Handle& image)> spoil;
-        int32_t code;
-    } cases[] = {
-        {"nothing", [](Handle&, Handle&) {}, TOV_SUCCESS},
-        {"the inner filter is deleted", [](Handle& inner, Handle&) { inner.remove(); }, TOV_ERROR_INVALID_FILTER},
-        {"the inner image is deleted", [](Handle&, Handle& image) { image.remove(); }, TOV_ERROR_INVALID_IMAGE},
-        {"the inner image is too small",
-         [](Handle& inner, Handle& image) {
-             image = newImage(Picture(15, 16));
-             tovImageFilterSetParameterImage(inner, "srcBuffer", image);
-         },
-         TOV_ERROR_INVALID_OPERATION},
-        {"an inner value is not finite",
-         [](Handle& inner, Handle&) { tovImageFilterSetParameter1f(inner, "cKey", 1e38f * 10); },
-         TOV_ERROR_INVALID_PARAMETER},
-    };
-    for (const auto& [what, spoil, code] : cases) {
-        Handle image = newImage(picture_);
-        Handle inner = newFilter(TOV_IMAGE_FILTER_LINEAR_TONEMAP, {{"srcBuffer", tov_image{image}}});
-        const Handle outer = newFilter(TOV_IMAGE_FILTER_NORMALIZATION);
-        const Handle queue = newQueue();
-        ASSERT_EQ(tovCommandQueueAttachImageFilter(queue, outer, inner, result_), TOV_SUCCESS);
-        spoil(inner, image);
-        EXPECT_EQ(tovContextExecuteCommandQueue(context(), queue, nullptr, nullptr), code) << what;
-    }
+TEST_F(FusionRefusals, GiveTheCodeOfWhatIsNotFiniteDoesNotFitOrIsDeletedInside) {
+    Handle small = newImage(Picture(15, 16));
+    Handle inner = newFilter(TOV_IMAGE_FILTER_LINEAR_TONEMAP, {{"srcBuffer", image_}});
+    const Handle outer = newFilter(TOV_IMAGE_FILTER_NORMALIZATION);
+    const Handle queue = newQueue();
+    ASSERT_EQ(tovCommandQueueAttachImageFilter(queue, outer, inner, result_), TOV_SUCCESS);
+    const auto code = [&] { return tovContextExecuteCommandQueue(context(), queue, nullptr, nullptr); };
+    EXPECT_EQ(code(), TOV_SUCCESS);
+    tovImageFilterSetParameter1f(inner, "cKey", HUGE_VALF);
+    EXPECT_EQ(code(), TOV_ERROR_INVALID_PARAMETER);
+    tovImageFilterSetParameter1f(inner, "cKey", 1.0f);
+    tovImageFilterSetParameterImage(inner, "srcBuffer", small);
+    EXPECT_EQ(code(), TOV_ERROR_INVALID_OPERATION);
+    small.remove();
+    EXPECT_EQ(code(), TOV_ERROR_INVALID_IMAGE);
+    inner.remove();
+    EXPECT_EQ(code(), TOV_ERROR_INVALID_FILTER);
 }
 
 TEST_F(FusionRefusals, AskForTheSizeOfAResamplingFilterThatFeedsAnother) {
