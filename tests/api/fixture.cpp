@@ -3,30 +3,17 @@
 #include <unistd.h>
 
 namespace apitest {
-
 namespace {
 
-// Opened once per program, closed and cleaned up before it ends.
+// Opened by the first test that needs it, closed and cleaned up before the program ends.
 struct SharedDevice : testing::Environment {
-    std::filesystem::path directory;
+    const std::filesystem::path directory =
+        std::filesystem::temp_directory_path() / ("tov-api-tests-" + std::to_string(getpid()));
     Handle context;
 
-    void SetUp() override {
-        directory = std::filesystem::temp_directory_path() / ("tov-api-tests-" + std::to_string(getpid()));
-        std::filesystem::create_directories(directory);
-        context = open();
-    }
     void TearDown() override {
         context.remove();
-        std::error_code ignored;
-        std::filesystem::remove_all(directory, ignored);
-    }
-    Handle open() const {
-        Handle opened;
-        EXPECT_EQ(tovCreateContext(TOV_API_VERSION, TOV_BACKEND_API_OPENCL, TOV_DEVICE_TYPE_CPU, 0,
-                                   directory.string().c_str(), opened.out()),
-                  TOV_SUCCESS);
-        return opened;
+        std::filesystem::remove_all(directory);
     }
 };
 auto* const shared = static_cast<SharedDevice*>(testing::AddGlobalTestEnvironment(new SharedDevice));
@@ -53,7 +40,18 @@ int32_t setParameter(tov_image_filter filter, const Parameter& parameter) {
     return std::visit(Setter{filter, parameter.name}, parameter.value);
 }
 
+void setAll(tov_image_filter filter, const std::vector<tov_image>& auxiliary) {
+    static const std::vector<float> floats = {0.25f, 0.75f};  // read when the filter runs
+    for (const auto& [name, value] : {std::pair{"sigma", 1.0f}, {"avLum", 0.5f}, {"maxLum", 4.0f}})
+        setParameter(filter, {name, value});
+    for (const char* name : {"weights", "sigmas"}) Setter{filter, name}(floats);
+    for (const char* name : {"normalsImg", "positionsImg"}) setParameter(filter, {name, auxiliary[0]});
+    Setter{filter, "inputs"}(auxiliary);
+    setParameter(filter, {"inputsNum", 2u});
+}
+
 tov_context DeviceTest::context() {
+    if (shared->context == nullptr) shared->context = newContext();
     return shared->context;
 }
 
@@ -62,31 +60,7 @@ const std::filesystem::path& DeviceTest::cacheDirectory() {
 }
 
 Handle DeviceTest::newContext() {
-    return shared->open();
-}
-
-Handle DeviceTest::newImage(const tov_image_desc& desc, const void* data, tov_context owner) {
-    Handle image;
-    EXPECT_EQ(tovContextCreateImage(owner, &desc, data, image.out()), TOV_SUCCESS);
-    return image;
-}
-
-Handle DeviceTest::newImage(const Picture& picture, tov_context owner) {
-    return newImage(picture.desc(), picture.encoded().data(), owner);
-}
-
-Handle DeviceTest::newFilter(uint32_t type, const Parameters& parameters, tov_context owner) {
-    Handle filter;
-    EXPECT_EQ(tovContextCreateImageFilter(owner, type, filter.out()), TOV_SUCCESS) << "type " << type;
-    for (const Parameter& parameter : parameters)
-        EXPECT_EQ(setParameter(filter, parameter), TOV_SUCCESS) << parameter.name;
-    return filter;
-}
-
-Handle DeviceTest::newQueue(tov_context owner) {
-    Handle queue;
-    EXPECT_EQ(tovContextCreateCommandQueue(owner, queue.out()), TOV_SUCCESS);
-    return queue;
+    return created(tovCreateContext, 1u, 0u, uint32_t{TOV_DEVICE_TYPE_CPU}, 0, cacheDirectory().c_str());
 }
 
 Picture DeviceTest::read(tov_image image, Picture like) {

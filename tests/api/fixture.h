@@ -6,7 +6,6 @@
 #include <tov/tov.h>
 
 #include <array>
-#include <cstdint>
 #include <filesystem>
 #include <optional>
 #include <string>
@@ -22,7 +21,6 @@ namespace apitest {
 class Handle {
  public:
     Handle() = default;
-    explicit Handle(tov_object object) : object_(object) {}
     Handle(Handle&& other) noexcept : object_(std::exchange(other.object_, nullptr)) {}
     Handle& operator=(Handle&& other) noexcept {
         std::swap(object_, other.object_);
@@ -52,6 +50,8 @@ struct Parameter {
 using Parameters = std::vector<Parameter>;
 
 int32_t setParameter(tov_image_filter filter, const Parameter& parameter);
+// Sets values with which a filter of any type runs, of those that it has; the images must live until it ran.
+void setAll(tov_image_filter filter, const std::vector<tov_image>& auxiliary);
 
 // Standard output of a call, the library's diagnostics among it.
 template <class Body>
@@ -70,10 +70,19 @@ class DeviceTest : public testing::Test {
     static const std::filesystem::path& cacheDirectory();
     static Handle newContext();
 
-    static Handle newImage(const tov_image_desc& desc, const void* data = nullptr, tov_context owner = context());
-    static Handle newImage(const Picture& picture, tov_context owner = context());
-    static Handle newFilter(uint32_t type, const Parameters& parameters = {}, tov_context owner = context());
-    static Handle newQueue(tov_context owner = context());
+    static Handle newImage(const tov_image_desc& desc, const void* data = nullptr, tov_context owner = context()) {
+        return created(tovContextCreateImage, owner, &desc, data);
+    }
+    static Handle newImage(const Picture& picture, tov_context owner = context()) {
+        return newImage(picture.desc(), picture.encoded().data(), owner);
+    }
+    static Handle newFilter(uint32_t type, const Parameters& parameters = {}, tov_context owner = context()) {
+        Handle filter = created(tovContextCreateImageFilter, owner, type);
+        for (const Parameter& parameter : parameters)
+            EXPECT_EQ(setParameter(filter, parameter), TOV_SUCCESS) << type << " " << parameter.name;
+        return filter;
+    }
+    static Handle newQueue(tov_context owner = context()) { return created(tovContextCreateCommandQueue, owner); }
     // The image's pixels, which has the layout of the picture.
     static Picture read(tov_image image, Picture like);
 
@@ -83,6 +92,13 @@ class DeviceTest : public testing::Test {
     static Picture run(uint32_t type, const Picture& input, const Parameters& parameters = {},
                        const std::optional<Picture>& before = {});
     static Picture runInPlace(uint32_t type, const Picture& input, const Parameters& parameters = {});
+
+    template <class Create, class... Arguments>
+    static Handle created(Create* create, Arguments... arguments) {
+        Handle object;
+        EXPECT_EQ(create(arguments..., object.out()), TOV_SUCCESS);
+        return object;
+    }
 };
 
 }  // namespace apitest

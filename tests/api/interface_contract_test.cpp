@@ -1,14 +1,10 @@
 // The checks of the 27 functions, in their order and with their codes, and what is left alone when one fails.
-#include <memory>
-#include <tuple>
-
 #include "fixture.h"
 
 namespace apitest {
 namespace {
 
 constexpr tov_image_desc kDesc = {7, 5, 1, 0, 0, 4, TOV_COMPONENT_TYPE_FLOAT32};
-
 constexpr int32_t kInvalid = TOV_ERROR_INVALID_PARAMETER;
 
 class InterfaceContract : public DeviceTest {
@@ -23,6 +19,9 @@ class InterfaceContract : public DeviceTest {
     const Handle filter_ = newFilter(TOV_IMAGE_FILTER_GAMMA_CORRECTION);
     const Handle queue_ = newQueue();
     void* const deleted_ = newImage(kDesc).remove();
+    // A value for each of six setters; "cGamma" is a float.
+    const std::vector<Value> values_ = {
+        9.0f, 3u, Matrix{9}, tov_image{image_}, std::vector<float>(1), std::vector<tov_image>{image_}};
     uint64_t foreign_[8] = {};
     // Outputs, and what they hold before.
     void* out_ = &foreign_;
@@ -54,15 +53,11 @@ TEST_F(InterfaceContract, EveryFunctionRefusesEveryHandleThatIsNotOfItsKindBefor
             EXPECT_EQ(tovImageUnmap(h, nullptr), TOV_ERROR_INVALID_IMAGE);
         }
         if (h == filter_) continue;
-        EXPECT_EQ(tovImageFilterSetParameter1u(h, nullptr, 0), TOV_ERROR_INVALID_FILTER);
+        for (const Value& value : values_)
+            EXPECT_EQ(setParameter(h, {nullptr, value}), TOV_ERROR_INVALID_FILTER) << value.index();
         EXPECT_EQ(tovImageFilterSetParameter2u(h, "srcRec", 1, 1), TOV_ERROR_INVALID_FILTER);
-        EXPECT_EQ(tovImageFilterSetParameter1f(h, "cGamma", 1), TOV_ERROR_INVALID_FILTER);
         EXPECT_EQ(tovImageFilterSetParameter3f(h, nullptr, 0, 0, 0), TOV_ERROR_INVALID_FILTER);
         EXPECT_EQ(tovImageFilterSetParameter4f(h, nullptr, 0, 0, 0, 0), TOV_ERROR_INVALID_FILTER);
-        EXPECT_EQ(tovImageFilterSetParameter16f(h, nullptr, nullptr), TOV_ERROR_INVALID_FILTER);
-        EXPECT_EQ(tovImageFilterSetParameterImage(h, nullptr, nullptr), TOV_ERROR_INVALID_FILTER);
-        EXPECT_EQ(tovImageFilterSetParameterFloatArray(h, nullptr, nullptr, 1), TOV_ERROR_INVALID_FILTER);
-        EXPECT_EQ(tovImageFilterSetParameterImageArray(h, nullptr, nullptr, 1), TOV_ERROR_INVALID_FILTER);
         EXPECT_EQ(tovImageFilterGetInfo(h, 0, 0, nullptr, &size_), TOV_ERROR_INVALID_FILTER);
         EXPECT_EQ(tovParameterGetInfo(h, 0, 0, 8, text_, &size_), TOV_ERROR_INVALID_FILTER);
         EXPECT_EQ(tovCommandQueueAttachImageFilter(queue_, h, nullptr, nullptr), TOV_ERROR_INVALID_FILTER);
@@ -73,17 +68,13 @@ TEST_F(InterfaceContract, EveryFunctionRefusesEveryHandleThatIsNotOfItsKindBefor
 TEST_F(InterfaceContract, OtherArgumentsAreCheckedInTheirOrder) {
     const tov_context c = context();
     auto* const cl = reinterpret_cast<_cl_context*>(&foreign_);
-    auto* const device = reinterpret_cast<_cl_device_id*>(&foreign_);
     auto* const memory = reinterpret_cast<_cl_mem*>(&foreign_);
-    uint32_t count = 0;
-    EXPECT_EQ(tovGetDeviceCount(0, 1, &count), TOV_SUCCESS);
-    const auto beyond = static_cast<int32_t>(count);
+    auto* const device = reinterpret_cast<_cl_device_id*>(&foreign_);
     EXPECT_EQ(tovGetDeviceCount(0, 1, nullptr), kInvalid);
     EXPECT_EQ(tovCreateContext(2, 0, 1, 0, "", nullptr), TOV_ERROR_INVALID_API_VERSION);
     EXPECT_EQ(tovCreateContext(1, 0, 1, -1, "", nullptr), kInvalid);
-    EXPECT_EQ(tovCreateContext(1, 0, 1, -1, "", &out_), TOV_ERROR_INVALID_CONTEXT);
-    EXPECT_EQ(tovCreateContext(1, 0, 1, beyond, "", &out_), TOV_ERROR_INVALID_CONTEXT);
-    EXPECT_EQ(tovCreateContext(1, 2, 1, 0, "", &out_), TOV_ERROR_INVALID_CONTEXT);
+    for (const auto& [backend, index] : {std::pair{0u, -1}, {0u, 4096}, {2u, 0}})
+        EXPECT_EQ(tovCreateContext(1, backend, 1, index, "", &out_), TOV_ERROR_INVALID_CONTEXT) << index;
     EXPECT_EQ(tovCreateContextFromOpenClContext(2, cl, device, nullptr, "", &out_), TOV_ERROR_INVALID_API_VERSION);
     EXPECT_EQ(tovCreateContextFromOpenClContext(1, cl, device, nullptr, "", &out_), kInvalid);
     EXPECT_EQ(tovContextGetDeviceInfo(c, nullptr, text_, 0, text_), kInvalid);
@@ -92,18 +83,13 @@ TEST_F(InterfaceContract, OtherArgumentsAreCheckedInTheirOrder) {
     EXPECT_EQ(tovContextCreateImage(c, nullptr, nullptr, nullptr), kInvalid);
     EXPECT_EQ(tovContextCreateImage(c, nullptr, nullptr, &out_), TOV_ERROR_INVALID_IMAGE_DESC);
     EXPECT_EQ(tovContextCreateImageFromOpenClMemory(c, nullptr, memory, 0, &out_), kInvalid);
-    EXPECT_EQ(tovContextCreateImageFromOpenClMemory(c, &kDesc, nullptr, 0, &out_), kInvalid);
-    EXPECT_EQ(tovContextCreateImageFromOpenGlTexture(c, 0, 0, 1, nullptr), kInvalid);
     EXPECT_EQ(tovContextCreateImageFilter(c, 21, nullptr), kInvalid);
     EXPECT_EQ(tovContextCreateImageFilter(c, 21, &out_), TOV_ERROR_INVALID_OPERATION);
     EXPECT_EQ(tovContextCreateCommandQueue(c, nullptr), kInvalid);
     EXPECT_EQ(tovImageMap(image_, 0, nullptr), kInvalid);
     EXPECT_EQ(tovImageUnmap(image_, nullptr), kInvalid);
     EXPECT_EQ(tovParameterGetInfo(filter_, 1, 0, 8, text_, &size_), kInvalid) << "the index before the key";
-    EXPECT_EQ(tovObjectDelete(nullptr), kInvalid);
-    EXPECT_EQ(tovObjectDelete(deleted_), kInvalid);
-    EXPECT_EQ(tovGetDeviceCount(1, 1, &count), TOV_SUCCESS);
-    EXPECT_EQ(count, 0u) << "another back end";
+    for (void* object : {static_cast<void*>(nullptr), deleted_}) EXPECT_EQ(tovObjectDelete(object), kInvalid);
 }
 
 TEST_F(InterfaceContract, QueriesWantRoomForTheWholeValueAndWriteNoMore) {
@@ -119,46 +105,33 @@ TEST_F(InterfaceContract, QueriesWantRoomForTheWholeValueAndWriteNoMore) {
         {parameter, TOV_PARAMETER_VALUE, 8}};
     for (const auto& [query, key, bytes] : rows) {
         std::string out(40, '#');
-        uint64_t size = 77;
-        EXPECT_EQ(query(key, bytes - 1, out.data(), &size), kInvalid) << key;
-        EXPECT_EQ(query(key, bytes, nullptr, &size), kInvalid) << key;
+        uint64_t size = 0;
+        EXPECT_EQ(query(key, bytes - 1, out.data(), &size_), kInvalid) << key;
+        EXPECT_EQ(query(key, bytes, nullptr, &size_), kInvalid) << key;
         EXPECT_EQ(query(key, bytes, out.data(), nullptr), kInvalid) << key;
-        EXPECT_EQ(query(0x7777, 0, out.data(), &size), kInvalid) << "size 0 before the key";
-        EXPECT_EQ(query(0x7777, 40, out.data(), &size), TOV_ERROR_UNSUPPORTED) << key;
-        EXPECT_EQ(size, 77u) << key;
+        EXPECT_EQ(query(0x7777, 40, out.data(), &size_), TOV_ERROR_UNSUPPORTED) << key;
+        EXPECT_EQ(out, std::string(40, '#')) << key;
         EXPECT_EQ(query(key, UINT64_MAX, out.data(), &size), TOV_SUCCESS) << key;
         EXPECT_EQ(size, bytes);
         EXPECT_EQ(out.substr(bytes), std::string(40 - bytes, '#')) << key;
     }
 }
 
-TEST_F(InterfaceContract, SettersTakeTheirOwnTypeAndExactNamesAndLeaveOtherValuesAlone) {
+TEST_F(InterfaceContract, SettersTakeTheirOwnTypeExactNamesAndLiveImagesAndLeaveOtherValuesAlone) {
     const Handle sum = newFilter(TOV_IMAGE_FILTER_WEIGHTED_SUM);
-    const Value values[] = {3u, Matrix{9}, tov_image{image_}, std::vector<float>{9}, std::vector<tov_image>{image_}};
-    for (const Value& value : values) {
-        EXPECT_EQ(setParameter(filter_, {"cGamma", value}), TOV_ERROR_UNSUPPORTED) << value.index();
+    const Handle motion = newFilter(TOV_IMAGE_FILTER_MOTION_BUFFER);
+    tov_image good[] = {image_, nullptr, motion};
+    EXPECT_EQ(tovImageFilterSetParameterImageArray(sum, "inputs", good, 3), TOV_SUCCESS);
+    for (const Value& value : values_) {
+        const int32_t code = value.index() == 1 ? TOV_SUCCESS : TOV_ERROR_UNSUPPORTED;
+        EXPECT_EQ(setParameter(filter_, {"cGamma", value}), code) << value.index();
         for (const char* name : {"", "cgamma", "cGamma ", "srcRec", "srcBufferSize"})
             EXPECT_EQ(setParameter(filter_, {name, value}), TOV_ERROR_INVALID_PARAMETER_NAME) << name << value.index();
     }
-    EXPECT_EQ(tovImageFilterSetParameter1f(filter_, nullptr, 1), TOV_ERROR_INVALID_PARAMETER_NAME);
-    EXPECT_EQ(tovImageFilterSetParameter1f(sum, "inputsNum", 1), TOV_ERROR_UNSUPPORTED);
-    EXPECT_EQ(tovImageFilterSetParameter2u(filter_, "cGamma", 1, 2), TOV_ERROR_UNSUPPORTED);
+    EXPECT_EQ(tovImageFilterSetParameter2u(filter_, nullptr, 1, 1), TOV_ERROR_INVALID_PARAMETER_NAME);
     EXPECT_EQ(tovImageFilterSetParameter2u(filter_, "dstBufferSize", 1, 2), TOV_ERROR_INVALID_PARAMETER_NAME);
-    const float* value = nullptr;
-    uint64_t size = 0;
-    EXPECT_EQ(tovParameterGetInfo(filter_, 0, TOV_PARAMETER_VALUE, 8, &value, &size), TOV_SUCCESS);
-    EXPECT_EQ(*value, 1.0f);
-}
-
-TEST_F(InterfaceContract, ArraysHoldLiveImagesFiltersAndGapsOnlyAndRefusedOnesAreNotKept) {
-    const Handle motion = newFilter(TOV_IMAGE_FILTER_MOTION_BUFFER);
-    const Handle sum = newFilter(TOV_IMAGE_FILTER_WEIGHTED_SUM);
-    tov_image good[] = {image_, nullptr, motion};
     EXPECT_EQ(tovImageFilterSetParameter16f(motion, "viewProjMatrix", nullptr), kInvalid);
     EXPECT_EQ(tovImageFilterSetParameterFloatArray(sum, "weights", nullptr, 1), kInvalid);
-    EXPECT_EQ(tovImageFilterSetParameterFloatArray(sum, "weights", nullptr, 0), TOV_SUCCESS);
-    EXPECT_EQ(tovImageFilterSetParameterImageArray(sum, "inputs", nullptr, 0), TOV_SUCCESS);
-    EXPECT_EQ(tovImageFilterSetParameterImageArray(sum, "inputs", good, 3), TOV_SUCCESS);
     EXPECT_EQ(tovImageFilterSetParameterImageArray(sum, "inputs", nullptr, 2), kInvalid);
     EXPECT_EQ(tovImageFilterSetParameterImage(sum, "dstBuffer", motion), kInvalid) << "a filter as output";
     for (tov_object handle : {tov_object{queue_}, deleted_, tov_object{&foreign_}}) {
@@ -167,23 +140,24 @@ TEST_F(InterfaceContract, ArraysHoldLiveImagesFiltersAndGapsOnlyAndRefusedOnesAr
         EXPECT_EQ(tovImageFilterSetParameterImage(sum, "no such name", handle), TOV_ERROR_INVALID_IMAGE);
     }
     tov_image* const* kept = nullptr;
+    const float* value = nullptr;
     uint64_t size = 0;
-    ASSERT_EQ(tovParameterGetInfo(sum, 0, TOV_PARAMETER_VALUE, 8, &kept, &size), TOV_SUCCESS);
+    EXPECT_EQ(tovParameterGetInfo(filter_, 0, TOV_PARAMETER_VALUE, 8, &value, &size), TOV_SUCCESS);
+    EXPECT_EQ(*value, 9.0f);
+    EXPECT_EQ(tovParameterGetInfo(sum, 0, TOV_PARAMETER_VALUE, 8, &kept, &size), TOV_SUCCESS);
     EXPECT_EQ(*kept, good);
 }
 
 TEST_F(InterfaceContract, ACircleIsFoundAlsoBehindMoreWaysThanCanBeWalked) {
+    const Handle first = newFilter(TOV_IMAGE_FILTER_MULTIPLY);
     std::vector<Handle> chain;
-    chain.push_back(newFilter(TOV_IMAGE_FILTER_MULTIPLY));
-    auto inputs = std::make_unique<std::array<std::array<tov_image, 2>, 40>>();
-    for (auto& both : *inputs) {
-        both = {chain.back(), chain.back()};  // two edges each: 2^40 paths
-        chain.push_back(newFilter(TOV_IMAGE_FILTER_MULTIPLY));
-        ASSERT_EQ(tovImageFilterSetParameterImageArray(chain.back(), "inputs", both.data(), 2), TOV_SUCCESS);
+    tov_image last = first;
+    for (int i = 0; i < 40; ++i) {
+        tov_image both[] = {last, last};  // two edges each: 2^40 paths; hosts may reuse the array where nothing runs
+        last = chain.emplace_back(newFilter(TOV_IMAGE_FILTER_MULTIPLY));
+        ASSERT_EQ(tovImageFilterSetParameterImageArray(last, "inputs", both, 2), TOV_SUCCESS);
     }
-    inputs.reset();  // as hosts may where the filters no longer run
-    EXPECT_EQ(tovImageFilterSetParameterImage(chain.front(), "srcBuffer", chain.back()), kInvalid);
-    EXPECT_EQ(tovImageFilterSetParameterImage(filter_, "cGamma", filter_), TOV_ERROR_UNSUPPORTED) << "binds nothing";
+    EXPECT_EQ(tovImageFilterSetParameterImage(first, "srcBuffer", last), kInvalid);
 }
 
 }  // namespace

@@ -10,27 +10,20 @@ namespace apitest {
 
 namespace {
 
-constexpr double kInfinite = std::numeric_limits<double>::infinity();
+constexpr float kInfinite = std::numeric_limits<float>::infinity();
 
-// IEEE halves, rounded to nearest even.
+// IEEE halves are floats of a smaller bias: scaled by its difference, their bits are the upper ones of a float.
 uint32_t halfFromFloat(float value) {
     const uint32_t sign = std::signbit(value) ? 0x8000u : 0u;
-    const double magnitude = std::abs(double{value});
+    const auto bits = std::bit_cast<uint32_t>(std::abs(value) * 0x1p-112f);
     if (std::isnan(value)) return sign | 0x7e00u;
-    if (magnitude >= 65520.0) return sign | 0x7c00u;  // rounds to the next power: infinity
-    const int exponent = std::max(std::ilogb(magnitude), -14);
-    // A mantissa that rounds up to the next power carries into the exponent, as the bits are meant to.
-    return sign | (static_cast<uint32_t>(exponent + 14) * 1024u +
-                   static_cast<uint32_t>(std::nearbyint(std::ldexp(magnitude, 10 - exponent))));
+    return sign | std::min(0x7c00u, (bits + 0xfffu + (bits >> 13 & 1u)) >> 13);  // to nearest even
 }
 
 float floatFromHalf(uint32_t bits) {
-    const double sign = (bits & 0x8000u) != 0 ? -1.0 : 1.0;
-    const int exponent = static_cast<int>(bits >> 10) & 31;
-    const int mantissa = static_cast<int>(bits) & 1023;
-    if (exponent == 31) return mantissa != 0 ? std::nanf("") : static_cast<float>(sign * kInfinite);
-    const double value = exponent == 0 ? std::ldexp(mantissa, -24) : std::ldexp(mantissa + 1024, exponent - 25);
-    return static_cast<float>(sign * value);
+    const float magnitude = std::bit_cast<float>((bits & 0x7fffu) << 13) * 0x1p112f;
+    const float finite = (bits & 0x8000u) != 0 ? -magnitude : magnitude;
+    return magnitude < 65536 ? finite : magnitude > 65536 ? std::nanf("") : finite * kInfinite;
 }
 
 float stored(double value, uint32_t type) {
@@ -44,19 +37,6 @@ size_t bytesOf(uint32_t type) {
     return type == TOV_COMPONENT_TYPE_UINT8 ? 1 : type == TOV_COMPONENT_TYPE_FLOAT16 ? 2 : 4;
 }
 
-double worst(const Picture& a, const Picture& b, bool isRelative) {
-    if (a.width != b.width || a.height != b.height || a.layout != b.layout) return kInfinite;
-    double result = 0.0;
-    for (size_t i = 0; i < a.values.size(); ++i) {
-        const double x = a.values[i];
-        const double y = b.values[i];
-        if (x == y || (std::isnan(x) && std::isnan(y))) continue;
-        if (!std::isfinite(x) || !std::isfinite(y)) return kInfinite;
-        result = std::max(result, std::abs(x - y) / (isRelative ? std::max(1.0, std::abs(y)) : 1.0));
-    }
-    return result;
-}
-
 }  // namespace
 
 std::vector<Layout> allLayouts() {
@@ -66,16 +46,12 @@ std::vector<Layout> allLayouts() {
     return layouts;
 }
 
-Picture::Picture(uint32_t w, uint32_t h, Layout pictureLayout)
-    : width(w), height(h), layout(pictureLayout), values(size_t{w} * h * pictureLayout.components, 0.0f) {}
-
 Rgba Picture::at(uint32_t x, uint32_t y) const {
     const uint32_t count = layout.components;
     const double scale = layout.type == TOV_COMPONENT_TYPE_UINT8 ? 255.0 : 1.0;
     const float* pixel = &values[(size_t{y} * width + x) * count];
-    const double alpha = count % 2 == 0 ? double{pixel[count - 1]} / scale : 1.0;
-    if (count < 3) return {pixel[0] / scale, pixel[0] / scale, pixel[0] / scale, alpha};
-    return {pixel[0] / scale, pixel[1] / scale, pixel[2] / scale, alpha};
+    const auto component = [&](uint32_t i) { return double{pixel[count < 3 ? 0 : i]} / scale; };
+    return {component(0), component(1), component(2), count % 2 == 0 ? double{pixel[count - 1]} / scale : 1.0};
 }
 
 void Picture::set(uint32_t x, uint32_t y, const Rgba& rgba) {
@@ -130,12 +106,17 @@ Picture mapped(const Picture& input, Layout layout, const std::function<Rgba(con
     return painted(input.width, input.height, layout, [&](uint32_t x, uint32_t y) { return function(input.at(x, y)); });
 }
 
-double maxDifference(const Picture& a, const Picture& b) {
-    return worst(a, b, false);
-}
-
-double maxRelativeDifference(const Picture& picture, const Picture& reference) {
-    return worst(picture, reference, true);
+double maxDifference(const Picture& a, const Picture& b, bool isRelative) {
+    if (a.width != b.width || a.height != b.height || a.layout != b.layout) return kInfinite;
+    double result = 0.0;
+    for (size_t i = 0; i < a.values.size(); ++i) {
+        const double x = a.values[i];
+        const double y = b.values[i];
+        if (x == y || (std::isnan(x) && std::isnan(y))) continue;
+        if (!std::isfinite(x) || !std::isfinite(y)) return kInfinite;
+        result = std::max(result, std::abs(x - y) / (isRelative ? std::max(1.0, std::abs(y)) : 1.0));
+    }
+    return result;
 }
 
 bool isFinite(const Picture& picture) {

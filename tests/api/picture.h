@@ -34,7 +34,8 @@ struct Picture {
     std::vector<float> values;  // width * height * components
 
     Picture() = default;
-    Picture(uint32_t w, uint32_t h, Layout pictureLayout = kFloat4);
+    Picture(uint32_t w, uint32_t h, Layout l = kFloat4)
+        : width(w), height(h), layout(l), values(size_t{w} * h * l.components, 0.0f) {}
 
     tov_image_desc desc() const { return {width, height, 1, 0, 0, layout.components, layout.type}; }
     size_t pixelCount() const { return size_t{width} * height; }
@@ -55,9 +56,11 @@ Picture noise(uint32_t width, uint32_t height, Layout layout = kFloat4, double s
 Picture mapped(const Picture& input, Layout layout, const std::function<Rgba(const Rgba&)>& function);
 
 // Largest difference of stored values; infinite for pictures of other sizes or layouts, and where only one is finite.
-double maxDifference(const Picture& a, const Picture& b);
-// Largest difference over the larger of 1 and the reference's magnitude.
-double maxRelativeDifference(const Picture& picture, const Picture& reference);
+// A relative one is over the larger of 1 and the magnitude in b.
+double maxDifference(const Picture& a, const Picture& b, bool isRelative = false);
+inline double maxRelativeDifference(const Picture& picture, const Picture& reference) {
+    return maxDifference(picture, reference, true);
+}
 bool isFinite(const Picture& picture);
 
 }  // namespace apitest
