@@ -212,8 +212,8 @@ Picture regressionReference(const Scene& s, uint32_t halfWindow, double bandwidt
         double weights = 0.0;
         for (uint32_t v = y / 8 * 8; v < std::min(y / 8 * 8 + 8, kHeight); ++v)  // of the same group
             for (uint32_t u = x / 8 * 8; u < std::min(x / 8 * 8 + 8, kWidth); ++u) {
-                const double dx = double(u) - x, dy = double(v) - y;
-                const double weight = std::abs(dx) > 3 || std::abs(dy) > 3 ? 0 : std::exp(-0.5 * (dx * dx + dy * dy));
+                const double dx = std::abs(double(u) - x), dy = std::abs(double(v) - y);
+                const double weight = std::max(dx, dy) > 3 ? 0 : std::exp(-0.5 * (dx * dx + dy * dy));
                 sum += weight * scales.at(u, v)[0];
                 weights += weight;
             }
