@@ -12,6 +12,9 @@
 
 namespace {
 
+// A type of no more than its words, and a name that no macro and no fused text uses itself.
+const std::string kArgument = "^[^(),/]+ (?!(x|y|buffer|bufferSize|xidx|yidx)$)[A-Za-z_]\\w*$";
+
 std::vector<std::string> allMatches(const std::string& text, const std::string& pattern, size_t group = 0) {
     const std::regex expression(pattern);
     std::vector<std::string> found;
@@ -53,8 +56,8 @@ TEST(KernelForm, EveryKernelParsesAndFusableOnesReadTheirPixelAndWriteOnceAtTheE
             SCOPED_TRACE(pass.kernel);
             const TovKernelCode& code = embeddedKernelCode(pass.program, pass.kernel);
             EXPECT_FALSE(code.arguments.empty());
-            for (const auto& [name, argumentType] : code.arguments)
-                EXPECT_EQ(allMatches(name, "^(?!(x|y|buffer|bufferSize|xidx|yidx)$)[A-Za-z_]\\w*$").size(), 1u) << name;
+            for (const auto& [name, kind] : code.arguments)
+                EXPECT_EQ(allMatches(kind + " " + name, kArgument).size(), 1u) << kind << " " << name;
             if (!filterSpec(type).fusable) continue;
             expectFusableForm(code.body);
             ++fusable;
