@@ -1,10 +1,10 @@
 // A scripted stand-in for the OpenCL library. Built as libOpenCL.so.1 into a folder of its own, it is found through the
 // library path by whatever opens that name. It keeps platforms, devices, buffers, programs and kernels in memory;
-// kernels compute nothing unless onLaunch does. A test scripts it and reads its log through state():
+// kernels compute nothing. A test scripts it and reads its log through state():
 //
 //     standin::State& driver = standin::state();
 //     driver.reset();                                       // in every SetUp
-//     driver.platforms = {{.vendor = "Apple", .devices = {standin::gpu("Small")}}};
+//     driver.platforms = {{.vendor = "Apple", .devices = {{"Small"}}}};
 //     driver.fail("clCreateBuffer", CL_OUT_OF_RESOURCES);   // the next call fails
 //     ...
 //     EXPECT_EQ(driver.launches.back().kernel, "GammaKernel");
@@ -27,8 +27,8 @@
 #include <algorithm>
 #include <cstdint>
 #include <cstring>
-#include <functional>
 #include <map>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -46,13 +46,6 @@ struct Device {
     uint64_t globalMemory = uint64_t{4} << 30;   // bytes
     uint64_t maxAllocation = uint64_t{1} << 30;  // bytes
 };
-
-inline Device gpu(std::string name) {
-    return {.name = std::move(name)};
-}
-inline Device cpu(std::string name) {
-    return {.name = std::move(name), .type = CL_DEVICE_TYPE_CPU};
-}
 
 struct Platform {
     std::string vendor = "Stand-in vendor";
@@ -87,12 +80,11 @@ struct Launch {
 
 struct State {
     // What the machine offers. Without platforms clGetPlatformIDs gives -1001.
-    std::vector<Platform> platforms = {{.devices = {gpu("Stand-in GPU"), cpu("Stand-in CPU")}}};
-    std::string buildLog;                         // of every build
-    size_t glDevice = 0;                          // the device of the first platform that runs OpenGL
-    int32_t eventStatus = CL_SUBMITTED;           // of all events
-    uint64_t queueThread = 0;                     // answers the vendor-specific queue query 0x403E
-    std::function<void(const Launch&)> onLaunch;  // called at each launch, may read and write bytesOf()
+    std::vector<Platform> platforms = {{.devices = {{"Stand-in GPU"}, {"Stand-in CPU", CL_DEVICE_TYPE_CPU}}}};
+    std::string buildLog;                // of every build
+    size_t glDevice = 0;                 // the device of the first platform that runs OpenGL
+    int32_t eventStatus = CL_SUBMITTED;  // of all events
+    uint64_t queueThread = 0;            // answers the vendor-specific queue query 0x403E
 
     // What happened.
     std::vector<Call> calls;
@@ -101,7 +93,8 @@ struct State {
 
     // Makes a call fail with the status from its at-th time on from now, count times.
     void fail(const std::string& call, int32_t status, uint32_t at = 1, uint32_t count = 1) {
-        failures[call] = {status, at, count};
+        statuses[call].assign(at - 1, CL_SUCCESS);
+        statuses[call].insert(statuses[call].end(), count, status);
     }
 
     size_t callCount(const std::string& name) const {
@@ -112,28 +105,16 @@ struct State {
         const auto call = std::find_if(calls.rbegin(), calls.rend(), [&](const Call& c) { return c.name == name; });
         return call == calls.rend() ? Call{} : *call;
     }
-    // Objects created and not released; of one kind: "context", "queue", "memory", "program", "kernel", "event".
-    size_t liveObjects(const std::string& kind = "") const {
-        return static_cast<size_t>(
-            std::ranges::count_if(live, [&](const auto& object) { return kind.empty() || kind == object.second; }));
-    }
+    // Objects created and not released.
+    size_t liveObjects() const { return live.size(); }
 
-    // Forgets script and log. Live objects stay known.
-    void reset() {
-        State fresh;
-        fresh.live.swap(live);
-        fresh.maps.swap(maps);
-        *this = std::move(fresh);
-    }
+    // Forgets script, log and objects.
+    void reset() { *this = State{}; }
 
     // The library's own.
-    struct Failure {
-        int32_t status;
-        uint32_t at, count;
-    };
-    std::map<std::string, Failure> failures;
-    std::map<const void*, std::string> live;
-    std::map<std::pair<const void*, const void*>, uint32_t> maps;  // memory object and pointer, not yet unmapped
+    std::map<std::string, std::vector<int32_t>> statuses;     // of each call's next times
+    std::map<const void*, std::string> live;                  // objects and their kinds
+    std::multiset<std::pair<const void*, const void*>> maps;  // memory object and pointer, not yet unmapped
 };
 
 // A function of the library for the test's own use: function<decltype(clCreateImage)>("clCreateImage").

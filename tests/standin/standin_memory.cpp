@@ -1,60 +1,32 @@
 // Buffers, images and their mapping, and objects shared with OpenGL, of the stand-in.
 #include "standin_objects.h"
 
-namespace standin {
-namespace {
+using namespace standin;
 
-bool holds(cl_mem memory, size_t offset, size_t bytes) {
+static bool holds(cl_mem memory, size_t offset, size_t bytes) {
     return bytes > 0 && offset <= memory->size && bytes <= memory->size - offset;
 }
 
-// Fresh bytes are calloc's zeros, so a big buffer costs nothing until it is touched.
-std::unique_ptr<_cl_mem> makeMemory(cl_context context, cl_mem_flags flags, size_t size, void* host) {
-    auto memory = std::make_unique<_cl_mem>();
-    memory->context = context;
-    memory->flags = flags;
-    memory->size = size;
-    memory->bytes = static_cast<unsigned char*>(host);
-    if ((flags & CL_MEM_USE_HOST_PTR) != 0) return memory;
-    memory->own.reset(static_cast<unsigned char*>(std::calloc(size, 1)));
-    memory->bytes = memory->own.get();
-    if (host != nullptr && memory->bytes != nullptr) std::memcpy(memory->bytes, host, size);
-    return memory;
-}
-
 // Its bytes are enough for any format.
-std::unique_ptr<_cl_mem> makeImage(cl_context context, cl_image_format format, size_t width, size_t height) {
-    auto memory = makeMemory(context, CL_MEM_READ_WRITE, width * height * 16, nullptr);
-    memory->format = format;
-    memory->width = width;
-    memory->height = height;
-    return memory;
+static _cl_mem imageOf(cl_context context, cl_image_format format, size_t width, size_t height) {
+    return {context, CL_MEM_READ_WRITE, width * height * 16, width, height, format};
 }
-
-}  // namespace
-}  // namespace standin
-
-using namespace standin;
 
 STANDIN_API unsigned char* standin_bytes(cl_mem memory, size_t* bytes) {
-    if (script().live.count(memory) == 0) return nullptr;
     if (bytes != nullptr) *bytes = memory->size;
     return memory->bytes;
 }
 
-// numbers: flags, size, host pointer.
+// numbers: flags, size, host pointer. The host's memory is not used.
 STANDIN_API cl_mem clCreateBuffer(cl_context context, cl_mem_flags flags, size_t size, void* host, cl_int* out) {
-    int32_t status = enter({"clCreateBuffer", {}, {flags, size, reinterpret_cast<uint64_t>(host)}}, context);
-    const bool readsHost = (flags & (CL_MEM_USE_HOST_PTR | CL_MEM_COPY_HOST_PTR)) != 0;
-    if (status == CL_SUCCESS && size == 0) status = CL_INVALID_BUFFER_SIZE;
-    if (status == CL_SUCCESS && readsHost != (host != nullptr)) status = CL_INVALID_HOST_PTR;
-    return give(out, status, makeMemory(context, flags, size, host));
+    const int32_t status = enter({"clCreateBuffer", {}, {flags, size, reinterpret_cast<uint64_t>(host)}}, context);
+    return give(out, status, _cl_mem{context, flags, size});
 }
 
 STANDIN_API cl_mem clCreateImage(cl_context context, cl_mem_flags, const cl_image_format* format,
-                                 const cl_image_desc* description, void*, cl_int* out) {
-    const int32_t status = enter({"clCreateImage"}, context);
-    return give(out, status, makeImage(context, *format, description->image_width, description->image_height));
+                                 const cl_image_desc* size, void*, cl_int* out) {
+    return give(out, enter({"clCreateImage"}, context),
+                imageOf(context, *format, size->image_width, size->image_height));
 }
 
 // numbers: flags, target, level, texture. The image is 8 x 8 pixels of four 8-bit components.
@@ -62,7 +34,7 @@ STANDIN_API cl_mem clCreateFromGLTexture(cl_context context, cl_mem_flags flags,
                                          cl_GLuint texture, cl_int* out) {
     const int32_t status =
         enter({"clCreateFromGLTexture", {}, {flags, target, static_cast<uint64_t>(level), texture}}, context);
-    return give(out, status, makeImage(context, {CL_RGBA, CL_UNORM_INT8}, 8, 8));
+    return give(out, status, imageOf(context, {CL_RGBA, CL_UNORM_INT8}, 8, 8));
 }
 
 STANDIN_RELEASE(clReleaseMemObject, cl_mem)
@@ -88,7 +60,7 @@ STANDIN_API void* clEnqueueMapBuffer(cl_command_queue queue, cl_mem memory, cl_b
     *out = enter({"clEnqueueMapBuffer", {}, {blocking, flags, offset, bytes}}, queue, memory);
     if (*out == CL_SUCCESS && !holds(memory, offset, bytes)) *out = CL_INVALID_VALUE;
     if (*out != CL_SUCCESS) return nullptr;
-    ++script().maps[{memory, memory->bytes + offset}];
+    script().maps.emplace(memory, memory->bytes + offset);
     return memory->bytes + offset;
 }
 
@@ -99,7 +71,7 @@ STANDIN_API cl_int clEnqueueUnmapMemObject(cl_command_queue queue, cl_mem memory
         script().misuse.emplace_back("clEnqueueUnmapMemObject of a pointer not mapped");
         return CL_INVALID_VALUE;
     }
-    if (--map->second == 0) script().maps.erase(map);
+    script().maps.erase(map);
     return CL_SUCCESS;
 }
 
@@ -107,7 +79,6 @@ STANDIN_API cl_int clEnqueueCopyBuffer(cl_command_queue queue, cl_mem source, cl
                                        size_t destinationOffset, size_t bytes, STANDIN_EVENTS) {
     if (const int32_t status = enter({"clEnqueueCopyBuffer"}, queue, source, destination)) return status;
     if (!holds(source, sourceOffset, bytes) || !holds(destination, destinationOffset, bytes)) return CL_INVALID_VALUE;
-    if (source == destination) return CL_MEM_COPY_OVERLAP;
     std::memcpy(destination->bytes + destinationOffset, source->bytes + sourceOffset, bytes);
     return CL_SUCCESS;
 }

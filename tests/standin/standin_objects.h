@@ -6,73 +6,57 @@
 #include <algorithm>
 #include <cstdlib>
 #include <memory>
+#include <typeinfo>
 
 #define STANDIN_API extern "C" __attribute__((visibility("default")))
 #define STANDIN_EVENTS cl_uint, const cl_event*, cl_event*
 
-namespace standin {
-
-struct Kind {
-    const char* name;
-    int32_t invalid;  // status of a call with a dead handle
-};
-
-}  // namespace standin
-
-struct _cl_context {
-    static constexpr standin::Kind kKind{"context", CL_INVALID_CONTEXT};
-    cl_device_id device = nullptr;
-};
-struct _cl_command_queue {
-    static constexpr standin::Kind kKind{"queue", CL_INVALID_COMMAND_QUEUE};
-};
+struct _cl_context {};
+struct _cl_command_queue {};
+struct _cl_event {};
 struct _cl_mem {
-    static constexpr standin::Kind kKind{"memory", CL_INVALID_MEM_OBJECT};
-    cl_context context = nullptr;
-    cl_mem_flags flags = 0;
-    size_t size = 0;
-    std::unique_ptr<unsigned char, decltype(&std::free)> own{nullptr, std::free};
-    unsigned char* bytes = nullptr;
-    cl_image_format format{};
+    cl_context context;
+    cl_mem_flags flags;
+    size_t size;
     size_t width = 0, height = 0;  // 0: a buffer
+    cl_image_format format{};
+    // Zeros of calloc, so that a big buffer costs nothing until it is touched.
+    std::unique_ptr<void, decltype(&std::free)> own{std::calloc(size, 1), std::free};
+    unsigned char* bytes = static_cast<unsigned char*>(own.get());
 };
 struct _cl_program {
-    static constexpr standin::Kind kKind{"program", CL_INVALID_PROGRAM};
     std::string source, options;
 };
 struct _cl_kernel {
-    static constexpr standin::Kind kKind{"kernel", CL_INVALID_KERNEL};
     standin::Launch launch;
-};
-struct _cl_event {
-    static constexpr standin::Kind kKind{"event", CL_INVALID_EVENT};
 };
 
 namespace standin {
 
 State& script();
 
-// Logs the call; the status it is scripted to fail with, else success.
+// Logs the call; the status that it is scripted to have.
 int32_t begin(Call call);
-// Success for a live object of the kind; the status of a dead one, which is misuse.
-int32_t checkLive(const std::string& call, const void* object, Kind kind);
+// Success for a live object of the kind; anything else is misuse.
+int32_t checkLive(const std::string& call, const void* object, const std::string& kind);
 
 // Begins an entry point: its scripted status, else that of the first dead handle, else success.
 template <class... Objects>
 int32_t enter(Call call, const Objects*... handles) {
     const std::string name = call.name;
     int32_t status = begin(std::move(call));
-    ((status = status != CL_SUCCESS ? status : checkLive(name, handles, Objects::kKind)), ...);
+    ((status = status != CL_SUCCESS ? status : checkLive(name, handles, typeid(Objects).name())), ...);
     return status;
 }
 
 // Ends a creating call: the new object, or null and the status.
 template <class Object>
-Object* give(cl_int* out, int32_t status, std::unique_ptr<Object> object) {
-    if (out != nullptr) *out = status;
+Object* give(cl_int* out, int32_t status, Object object) {
+    *out = status;
     if (status != CL_SUCCESS) return nullptr;
-    script().live[object.get()] = Object::kKind.name;
-    return object.release();
+    auto* const made = new Object(std::move(object));
+    script().live[made] = typeid(Object).name();
+    return made;
 }
 
 // The bytes that answer a query.

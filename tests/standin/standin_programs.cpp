@@ -1,39 +1,29 @@
-// Programs, kernels and launches of the stand-in. A binary is a mark, the options, a zero byte and the source.
+// Programs, kernels and launches of the stand-in. A binary is the options, a zero byte and the source.
 #include "standin_objects.h"
 
 using namespace standin;
 
-static const std::string kMark = "stand-in program\n";
-
 // text: the sources joined.
 STANDIN_API cl_program clCreateProgramWithSource(cl_context context, cl_uint count, const char** texts,
                                                  const size_t* lengths, cl_int* out) {
-    auto program = std::make_unique<_cl_program>();
-    for (cl_uint i = 0; i < count; ++i)
-        program->source += lengths != nullptr && lengths[i] != 0 ? std::string(texts[i], lengths[i]) : texts[i];
-    int32_t status = enter({"clCreateProgramWithSource", program->source}, context);
-    if (status == CL_SUCCESS && count == 0) status = CL_INVALID_VALUE;
-    return give(out, status, std::move(program));
+    std::string source;
+    for (cl_uint i = 0; i < count; ++i) source += lengths[i] != 0 ? std::string(texts[i], lengths[i]) : texts[i];
+    return give(out, enter({"clCreateProgramWithSource", source}, context), _cl_program{source, {}});
 }
 
 // text: the binary.
 STANDIN_API cl_program clCreateProgramWithBinary(cl_context context, cl_uint, const cl_device_id*, const size_t* sizes,
                                                  const unsigned char** binaries, cl_int* accepted, cl_int* out) {
     const std::string binary(reinterpret_cast<const char*>(binaries[0]), sizes[0]);
-    auto program = std::make_unique<_cl_program>();
-    int32_t status = enter({"clCreateProgramWithBinary", binary}, context);
-    const size_t end = binary.find('\0', kMark.size());
-    if (status == CL_SUCCESS && (!binary.starts_with(kMark) || end == std::string::npos)) status = CL_INVALID_BINARY;
-    if (status == CL_SUCCESS) program->source = binary.substr(end + 1);
-    if (accepted != nullptr) *accepted = status;
-    return give(out, status, std::move(program));
+    *accepted = enter({"clCreateProgramWithBinary", binary}, context);
+    return give(out, *accepted, _cl_program{binary.substr(binary.find('\0') + 1), {}});
 }
 
 // text: the option text.
 STANDIN_API cl_int clBuildProgram(cl_program program, cl_uint, const cl_device_id*, const char* options,
                                   void(CL_CALLBACK*)(cl_program, void*), void*) {
-    if (const int32_t status = enter({"clBuildProgram", options != nullptr ? options : ""}, program)) return status;
-    program->options = options != nullptr ? options : "";
+    if (const int32_t status = enter({"clBuildProgram", options}, program)) return status;
+    program->options = options;
     return CL_SUCCESS;
 }
 
@@ -41,7 +31,7 @@ STANDIN_RELEASE(clReleaseProgram, cl_program)
 
 STANDIN_API cl_int clGetProgramInfo(cl_program program, cl_program_info key, size_t capacity, void* out, size_t* size) {
     if (const int32_t status = enter({"clGetProgramInfo"}, program)) return status;
-    const std::string binary = kMark + program->options + '\0' + program->source;
+    const std::string binary = program->options + '\0' + program->source;
     if (key != CL_PROGRAM_BINARIES)
         return answer({{CL_PROGRAM_BINARY_SIZES, bytesOfValue(binary.size())}}, key, capacity, out, size);
     binary.copy(static_cast<char**>(out)[0], binary.size());
@@ -56,11 +46,9 @@ STANDIN_API cl_int clGetProgramBuildInfo(cl_program program, cl_device_id, cl_pr
 
 // The kernel's name must stand in the source.
 STANDIN_API cl_kernel clCreateKernel(cl_program program, const char* name, cl_int* out) {
-    auto kernel = std::make_unique<_cl_kernel>();
     int32_t status = enter({"clCreateKernel"}, program);
     if (status == CL_SUCCESS && program->source.find(name) == std::string::npos) status = CL_INVALID_KERNEL_NAME;
-    if (status == CL_SUCCESS) kernel->launch = {.kernel = name, .options = program->options};
-    return give(out, status, std::move(kernel));
+    return give(out, status, _cl_kernel{{.kernel = name, .options = program->options}});
 }
 
 STANDIN_RELEASE(clReleaseKernel, cl_kernel)
@@ -80,6 +68,5 @@ STANDIN_API cl_int clEnqueueNDRangeKernel(cl_command_queue queue, cl_kernel kern
     launch.global.assign(global, global + dimensions);
     launch.local.assign(local, local + dimensions);
     script().launches.push_back(launch);
-    if (script().onLaunch) script().onLaunch(launch);
     return CL_SUCCESS;
 }
