@@ -5,10 +5,8 @@
 #include <CL/cl.h>
 #include <dlfcn.h>
 
-extern "C" __attribute__((visibility("default"))) void* clEnqueueMapBuffer(cl_command_queue q, cl_mem buffer,
-                                                                           cl_bool wait, cl_map_flags flags, size_t at,
-                                                                           size_t size, cl_uint n, const cl_event* list,
-                                                                           cl_event* event, cl_int* status) {
+void* clEnqueueMapBuffer(cl_command_queue q, cl_mem buffer, cl_bool wait, cl_map_flags flags, size_t at, size_t size,
+                         cl_uint n, const cl_event* list, cl_event* event, cl_int* status) {
     static void* const runtime = dlopen(OCLGRIND_RUNTIME, RTLD_NOW);
     static auto* const map = reinterpret_cast<decltype(&clEnqueueMapBuffer)>(dlsym(runtime, "clEnqueueMapBuffer"));
     return map(q, buffer, wait, flags & ~cl_map_flags{CL_MAP_READ}, at, size, n, list, event, status);
