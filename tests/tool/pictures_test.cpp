@@ -14,18 +14,16 @@ using Indices = std::vector<int>;
 const std::string kCopy = "run -f linear_tonemap ";  // its default multiplies by one
 
 TEST_F(Pictures, OfEveryKindKeepTheirChannelsAndValues) {
-    const std::pair<std::string, OIIO::TypeDesc> formats[] = {{"png", OIIO::TypeDesc::UINT8},
-                                                              {"exr", OIIO::TypeDesc::HALF},
-                                                              {"exr", OIIO::TypeDesc::FLOAT},
-                                                              {"tif", OIIO::TypeDesc::FLOAT}};
-    for (const auto& [ending, type] : formats) {
+    for (const auto& [ending, type] : {std::pair{std::string("png"), OIIO::TypeDesc::UINT8},
+                                       {"exr", OIIO::TypeDesc::HALF},
+                                       {"tif", OIIO::TypeDesc::FLOAT}}) {
         for (const Names& channels : {Names{"Y"}, Names{"Y", "A"}, kRgb, Names{"R", "G", "B", "A"}, Names{"Z"}}) {
             store("in." + ending, {13, 9, channels, kQuarters, type});
-            EXPECT_EQ(tov(kCopy + "in." + ending + " -o out." + ending).err, "");
+            expect(0, "", kCopy + "in." + ending + " -o out." + ending);
             const Stored before = load("in." + ending);
             const Stored after = load("out." + ending);
             EXPECT_EQ(after.channels, before.channels) << ending;
-            EXPECT_EQ(after.type, type) << ending << " of " << channels.size();
+            EXPECT_EQ(after.type, OIIO::TypeDesc(type)) << ending;
             EXPECT_EQ(after.values, before.values) << ending << " of " << channels.size();
         }
     }
@@ -37,7 +35,7 @@ TEST_F(Pictures, PassOnWhatIsNotFiniteAndGrowToFloatsWhereHalvesDoNotSuffice) {
     const Values large = made("run in.exr -f linear_tonemap:cKey=1048576").values;
     EXPECT_TRUE(std::isnan(large[0]));
     EXPECT_EQ(Values(large.begin() + 1, large.end()), (Values{infinity, -infinity, 524288}));
-    EXPECT_EQ(tov("run in.exr -f linear_tonemap:cKey=2 -o out.png").status, 0);
+    expect(0, "", "run in.exr -f linear_tonemap:cKey=2 -o out.png");
     EXPECT_EQ(load("out.png").values, (Values{0, 1, 0, 1}));
 }
 
@@ -52,22 +50,12 @@ TEST_F(Pictures, AreTurnedUpright) {
     EXPECT_EQ(upright.values, (Values{0, 0.75f}));
 }
 
-TEST_F(Pictures, FollowTheExtensionAndLoseTheirAlphaWithANote) {
-    for (const char* name : {"a.jpg", "a.hdr"}) expect(0, "alpha is not written", kCopy + "$R -o " + name);
-    EXPECT_EQ(tov(kCopy + "$R -o a.PNG").err, "");
-    EXPECT_EQ(load("a.hdr").type, OIIO::TypeDesc::FLOAT);
-    EXPECT_EQ(load("a.PNG").type, OIIO::TypeDesc::UINT8);
-    EXPECT_EQ(load("a.PNG").channels.size(), 4u);
-}
-
 TEST_F(Pictures, AreMadeOfTheChannelsThatTheirNamesTell) {
     const std::pair<Names, Indices> rows[] = {
         {{"A", "B", "G", "R", "Z"}, {3, 2, 1, 0}},
-        {{"z", "a"}, {0, 1}},
         {{"X", "Y", "Z"}, {0, 1, 2}},
         {{"Y", "RY", "BY"}, {}},  // would need a conversion
         {{"X", "Y"}, {}},         // motion vectors, say
-        {{"V.Z", "V.R", "V.G", "V.B"}, {1, 2, 3}},
         {{"X.R", "X.G", "X.B", "V.RGBA.R", "V.RGBA.G", "V.RGBA.B", "Combined.R", "Combined.G", "Combined.B"},
          {6, 7, 8}},
         {{"rgba.R", "rgba.G", "rgba.B", "R", "G", "B"}, {3, 4, 5}}};

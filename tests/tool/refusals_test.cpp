@@ -9,35 +9,22 @@ using Refusals = Tool;
 TEST_F(Refusals, HaveAStatusAndAMessageAndLeaveTheOldFileAndNothingElse) {
     store("a.exr", {8, 6, kRgb, {1}});
     store("small.exr", {4, 3, kRgb, {1}});
-    store("layers.exr", {8, 6, {"N.X", "N.Y", "N.Z", "UV.U", "UV.V"}, {1}});
-    for (const std::string name : {"cut.jpg", "cut.exr"}) {
-        ASSERT_EQ(tov("run $R -f linear_tonemap -o " + name).status, 0);
-        fs::resize_file(name, fs::file_size(name) * 6 / 10);
-    }
+    store("layers.exr", {8, 6, {"N.X", "N.Y", "N.Z", "UV.U"}, {1}});
+    expect(0, "", "run $R -f linear_tonemap -o cut.exr");
+    fs::resize_file("cut.exr", fs::file_size("cut.exr") * 6 / 10);
     ASSERT_EQ(std::system("echo old >out.png; echo P6 100000 100000 255 >huge.ppm"), 0);
     const std::tuple<const char*, int, const char*> rows[] = {
         {"", 2, "devices, filters, run, denoise"},
         {"$RUN gama_correction", 2, "did you mean gamma_correction?"},
         {"$RUN gamma_correction:cGamma=1,5", 2, "param=value"},
-        {"$RUN gamma_correction:cGamma=1.5x", 2, "\"1.5x\" is not a number"},
         {"$RUN gamma_correction:cGamma=nan", 2, "not a finite number"},
         {"$RUN gamma_correction:cGamma=0", 1, "TOV_ERROR_INVALID_PARAMETER (-12)"},
-        {"$RUN simple_tonemap:cApplyToneMap=4294967296", 2, "out of range"},
-        {"$RUN resample:interpOperator=bicubical", 2, "did you mean bicubic?"},
         {"$RUN resample:size=20000x20000", 2, "268435455 pixels"},
-        {"$RUN sobel --size 8x8", 2, "resample stage"},
-        {"$RUN motion_buffer:viewProjMatrix=1+0+0", 2, "16 numbers"},
-        {"$RUN temporal_accumulation:outVarianceImg=a.exr", 2, "written by the filter"},
         {"$RUN multiply:inputs=a.exr+small.exr", 2, "small.exr has 4 x 3 pixels"},
-        {"$RUN resample:size=4x3 -f multiply:inputs=a.exr", 2, "resampled, has 4 x 3"},
-        {"$RUN mlaa:depthImg=none.exr:Z", 4, "none.exr:Z: there is no such file"},
         {"$RUN mlaa:normalsImg=layers.exr:M", 4, "its layers are N, UV"},
-        {"$RUN mlaa:normalsImg=layers.exr:UV", 4, "do not say how they make a picture: UV.U, UV.V"},
         {"run a.exr -f sobel -o out.foo", 5, "\".foo\""},
         {"run a.exr -f sobel -o missing/out.png", 5, "No such file or directory"},
         {"$RUN sobel --device cpu:99", 3, "cpu:0"},
-        {"$RUN sobel --cache a.exr", 1, "Not a directory"},
-        {"run -f sobel -o out.png cut.jpg", 4, "cannot read cut.jpg"},
         {"run -f sobel -o out.png cut.exr", 4, "cannot read cut.exr"},
         {"run -f sobel -o out.png /dev/zero", 4, "not a regular file"},
         {"run -f sobel -o out.png huge.ppm", 1, "160000000000 bytes; at most 4294967295"},
@@ -45,7 +32,7 @@ TEST_F(Refusals, HaveAStatusAndAMessageAndLeaveTheOldFileAndNothingElse) {
     for (const auto& [arguments, status, message] : rows)
         expect(status, message, arguments, "RUN='run a.exr -o out.png -f';");
     EXPECT_EQ(readFile("out.png"), "old\n");
-    EXPECT_EQ(std::distance(fs::directory_iterator("."), {}), 7) << "what was there before";
+    EXPECT_EQ(std::distance(fs::directory_iterator("."), {}), 6) << "what was there before";
 }
 
 TEST_F(Refusals, TellTheBytesThatABigPictureNeedsAndTheDeviceHas) {

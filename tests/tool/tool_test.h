@@ -21,8 +21,7 @@ const Names kRgb = {"R", "G", "B"};
 const Values kQuarters = {0, 0.75f, 0.25f, 1, 0.5f};  // exact in half and float
 
 struct Stored {
-    int width = 0;
-    int height = 0;
+    int width = 0, height = 0;
     Names channels = {};
     Values values = {};  // channels side by side; 8-bit values as 0 ... 1
     OIIO::TypeDesc type = OIIO::TypeDesc::FLOAT;
@@ -60,8 +59,7 @@ inline std::string readFile(const std::string& path) {
 
 struct Outcome {
     int status;
-    std::string out;
-    std::string err;
+    std::string out, err;
 };
 
 class Tool : public testing::Test {
@@ -81,13 +79,12 @@ class Tool : public testing::Test {
     void expect(int status, const std::string& message, const std::string& words,
                 const std::string& before = "") const {
         const Outcome outcome = tov(words, before);
-        EXPECT_EQ(outcome.status, status) << words;
+        EXPECT_EQ(outcome.status, status) << words << outcome.err;
         EXPECT_THAT(outcome.err, HasSubstr(message)) << words;
     }
     // The picture that a successful command writes.
-    Stored made(const std::string& arguments) const {
-        const Outcome outcome = tov(arguments + " -o made.exr");
-        EXPECT_EQ(outcome.status, 0) << arguments << ": " << outcome.err;
+    Stored made(const std::string& arguments, const std::string& before = "") const {
+        expect(0, "", arguments + " -o made.exr", before);
         return load("made.exr");
     }
 
