@@ -1,8 +1,6 @@
 // Rows of eight pixels: on central processors one item in eight takes the pixels of all eight, side by side in vectors.
 #if ON_CENTRAL_PROCESSOR
 
-#define INLINED static inline __attribute__((always_inline))
-
 // ReadFour(buffer, x, y) and WriteFour(buffer, x, y, rgba): four neighbouring pixels, RGBA after RGBA.
 #define DEFINE_READ_FOUR(layout, pointer)                                              \
     INLINED float16 ReadFour_##layout(pointer buffer, int2 bufferSize, int x, int y) { \

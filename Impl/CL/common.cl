@@ -7,8 +7,7 @@
 
 #define EXPAND(arg) arg
 
-// 1 on central processors, where vectors within an item and the cache do what items side by side and local memory do
-// elsewhere: a kernel may have a body for each.
+// 1 where vectors within an item and the cache do what items side by side and local memory do elsewhere.
 #if defined(__x86_64__) || defined(__i386__) || defined(__aarch64__) || defined(__arm__)
 #define ON_CENTRAL_PROCESSOR 1
 // Wide vectors are handed over between functions of one program only: how they would cross its border does not matter.
@@ -18,6 +17,8 @@
 #else
 #define ON_CENTRAL_PROCESSOR 0
 #endif
+// Functions over wide vectors, which a call would send through memory.
+#define INLINED static inline __attribute__((always_inline))
 
 // REPEAT(N, X) is X(0) X(1) ... X(N - 1).
 #define REPEAT_0(X)
@@ -393,7 +394,6 @@ static inline float8 ExposedFilm(float8 value, float exposure) {
 }
 
 // ---- Tone curves ---------------------------------------------------------------------------------------------------
-
 // Contrast about middle gray, exposure in stops, then on request the filmic curve of K. Narkowicz, "ACES Filmic Tone
 // Mapping Curve" (2016). It is above 1 from 7.3 on; the upper bound only keeps its squares finite.
 static inline float8 SimpleTone(float8 value, float exposure, float contrast, bool curved) {
@@ -408,7 +408,7 @@ static inline float8 SimpleTone(float8 value, float exposure, float contrast, bo
 }
 
 // What a pixel's luminance asks its colour to be scaled by, for one luminance and for those of eight pixels.
-
+//
 // With L = key * luminance the pixel is scaled by Ld / luminance, where Ld is L / (1 + L) mixed with L, or with a white
 // point w, L (1 + L / w^2) / (1 + L). Ld holds L as a factor, so the luminance cancels and black stays black. Both
 // curves are key * (constant + (1 - constant + slope * L) / (1 + L)). The bound on L keeps the products finite; the
