@@ -76,15 +76,3 @@ TEST_F(Devices, AdoptTheCallersObjectsWithTheirLimitsAlsoWhereNoDeviceWasFound) 
     device.reset();
     EXPECT_EQ(driver().liveObjects(), before) << "the caller's objects are as before";
 }
-
-TEST_F(Devices, OfTheHostHaveUncountedMemoryButNoKernels) {
-    const DeviceOwner host(zor::createDevice(zor::DEVICE_KIND_HOST, {}), zor::destroyDevice);
-    zor::Buffer<char> from(*host, 8, zor::BUFFER_DEFAULT);
-    zor::Buffer<char> to(*host, 8, zor::BUFFER_WRITE_ONLY);
-    std::memcpy(from.map(), "01234567", 8);
-    std::memset(to.map(), '-', 8);
-    to.copyFrom(from, 3);
-    EXPECT_EQ(std::string(static_cast<char*>(to.map()), 8), "012-----");
-    EXPECT_EQ(host->getUsedMemory(), 0u);
-    EXPECT_THROW(host->getKernel({}), zor::Error);
-}
