@@ -5,8 +5,6 @@
 #include <gtest/gtest.h>
 #include <tov/tov.h>
 
-namespace {
-
 TEST(RealOpenGl, DescribesTexturesWhileItsContextIsCurrent) {
     EGLDisplay display = eglGetDisplay(EGL_DEFAULT_DISPLAY);
     ASSERT_TRUE(eglInitialize(display, nullptr, nullptr) && eglBindAPI(EGL_OPENGL_API)) << "no EGL";
@@ -34,5 +32,3 @@ TEST(RealOpenGl, DescribesTexturesWhileItsContextIsCurrent) {
     EXPECT_EQ(tovObjectDelete(context), TOV_SUCCESS);
     eglTerminate(display);
 }
-
-}  // namespace

@@ -5,14 +5,11 @@
 #include "stage_groups.h"
 #include "tool_test.h"
 
-namespace tooltest {
-namespace {
-
 using Stages = Tool;
 using testing::ElementsAre;
 
 // Compiled apart or raised to a power, pixels differ by a few units in the last place.
-void expectNear(const Values& values, const Values& expected, double tolerance = 4e-6) {
+static void expectNear(const Values& values, const Values& expected, double tolerance = 4e-6) {
     ASSERT_EQ(values.size(), expected.size());
     for (size_t i = 0; i < values.size(); ++i) ASSERT_NEAR(values[i], expected[i], tolerance) << i;
 }
@@ -71,7 +68,7 @@ const Names kLayers = {"V.Albedo.Y", "V.Combined.R", "V.Combined.G", "V.Combined
                        "V.Depth.Z",  "V.Normal.X",   "V.Normal.Y",   "V.Normal.Z"};
 
 // Two walls that meet in the middle, with their features, under noise.
-Values walls(float noise) {
+static Values walls(float noise) {
     Values values;
     std::mt19937 generator(1);
     std::uniform_real_distribution<float> wall(0.4f - noise, 0.4f + noise);
@@ -85,7 +82,7 @@ Values walls(float noise) {
 }
 
 // Root of the mean square of the differences to the walls, of RGBA pictures whose alpha is kept.
-double error(const Stored& picture) {
+static double errorOf(const Stored& picture) {
     double sum = 0.0;
     for (size_t i = 0; i < picture.values.size(); ++i)
         sum += std::pow(picture.values[i] - (i % 4 == 3 ? 0.5 : i / 4 % 48 < 24 ? 0.4 : 0.8), 2);
@@ -94,17 +91,14 @@ double error(const Stored& picture) {
 
 TEST_F(Stages, DenoiseWithTheLayersThatAreFoundOrGivenOrWithColourAlone) {
     store("noisy.exr", {48, 48, kLayers, walls(0.15f)});
-    store("clean.exr", {48, 48, kLayers, walls(0.0f)});
+    store("clean.exr", {48, 48, kLayers, walls(0)});
     store("zero.exr", {48, 48, kRgb, {0}});
-    const double noise = error(made("run noisy.exr -f linear_tonemap"));
-    EXPECT_LT(error(made("denoise made.exr")), noise / 2);  // colour alone
-    EXPECT_LT(error(made("denoise noisy.exr --method lwr")), noise / 3);
+    const double noise = errorOf(made("run noisy.exr -f linear_tonemap"));
+    EXPECT_LT(errorOf(made("denoise made.exr")), noise / 2);  // colour alone
+    EXPECT_LT(errorOf(made("denoise noisy.exr --method lwr")), noise / 3);
     expect(0, "its layers are used: Albedo, Normal, Depth\nnote: no variance is given", "denoise noisy.exr -o out.exr");
-    EXPECT_LT(error(load("out.exr")), noise / 3);
+    EXPECT_LT(errorOf(load("out.exr")), noise / 3);
     const std::string given = "--variance zero.exr --normal clean.exr:Normal --albedo clean.exr";
     EXPECT_THAT(tov("denoise noisy.exr -o out.exr " + given).err, testing::EndsWith("its layers are used: Depth\n"));
-    EXPECT_NEAR(error(load("out.exr")), noise, 0.01) << "without variance there is no noise";
+    EXPECT_NEAR(errorOf(load("out.exr")), noise, 0.01) << "without variance there is no noise";
 }
-
-}  // namespace
-}  // namespace tooltest

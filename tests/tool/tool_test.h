@@ -10,8 +10,6 @@
 #include <filesystem>
 #include <fstream>
 
-namespace tooltest {
-
 namespace fs = std::filesystem;
 using testing::HasSubstr;
 using Names = std::vector<std::string>;
@@ -76,11 +74,10 @@ class Tool : public testing::Test {
         const int state = std::system((before + outputs + "$TOV " + arguments).c_str());
         return {WEXITSTATUS(state), readFile(directory_ + ".out"), readFile(directory_ + ".err")};
     }
-    void expect(int status, const std::string& message, const std::string& words,
-                const std::string& before = "") const {
+    void expect(int status, const std::string& text, const std::string& words, const std::string& before = "") const {
         const Outcome outcome = tov(words, before);
         EXPECT_EQ(outcome.status, status) << words << outcome.err;
-        EXPECT_THAT(outcome.err, HasSubstr(message)) << words;
+        EXPECT_THAT(outcome.err, HasSubstr(text)) << words;
     }
     // The picture that a successful command writes.
     Stored made(const std::string& arguments, const std::string& before = "") const {
@@ -90,5 +87,3 @@ class Tool : public testing::Test {
 
     std::string directory_ = fs::temp_directory_path() / "tov-test-XXXXXX";
 };
-
-}  // namespace tooltest
