@@ -219,13 +219,13 @@ void addBilateral() {
         for (const int radius : {2, 5, 10}) {
             const auto make = [type = type, radius]() -> Pair {
                 const cv::Mat input = picture(type);
-                Ours ours(TOV_IMAGE_FILTER_BILATERAL_DENOISE, input, input.size(),
-                          {{"radius", static_cast<float>(radius)}});
-                ours.useInputAsFeature(0.04f);
+                const std::vector<Value> values = {{"radius", static_cast<float>(radius)}};
+                const auto ours =
+                    std::make_shared<Ours>(TOV_IMAGE_FILTER_BILATERAL_DENOISE, input, input.size(), values);
+                ours->useInputAsFeature(0.04f);  // the filter keeps the addresses of its arrays
+                ours->attach();
                 const double sigma = input.depth() == CV_8U ? 51.0 : 0.2;
-                auto shared = std::make_shared<Ours>(std::move(ours));
-                shared->attach();
-                return {[shared] { shared->execute(); },
+                return {[ours] { ours->execute(); },
                         [input, output = cv::Mat(), radius, sigma]() mutable {
                             cv::bilateralFilter(input, output, 2 * radius + 1, sigma, 3.0, cv::BORDER_REPLICATE);
                         }};
