@@ -35,22 +35,31 @@ __constant float kSpline[3] = {0.375f, 0.25f, 0.0625f};
 
 #define IMAGE_PARAMETERS                                                                                      \
     srcBufferType(srcBuffer), srcBufferType(normalsBuff), srcBufferType(depthBuff), srcBufferType(transBuff), \
-        srcBufferType(vColorBuff), __global const float* slots
+        srcBufferType(vColorBuff), __global float* slots
 #define IMAGES srcBuffer, normalsBuff, depthBuff, transBuff, vColorBuff, slots
 
 // What the taps are compared with.
 typedef struct {
     Pixels color;
+    Floats variance;
     Pixels normal;  // Of length 1.
     Pixels transition;
     Floats depth;
+    Floats slope_x;  // Of the depth, between neighbouring taps.
+    Floats slope_y;
+    Ints color_usable;
     Ints normal_usable;
     Ints depth_usable;
     Ints transition_usable;
     Floats color_factor;  // Weights are 2^(factor * difference).
-    float normal_factor;
-    float transition_factor;
 } Centre;
+
+typedef struct {
+    float color;
+    float normal;
+    float depth;
+    float transition;
+} Sigmas;
 
 typedef struct {
     Floats x;
@@ -111,18 +120,6 @@ INLINED Ints ReadTransitions(srcBufferType(transBuff), Ints columns, int row, Pi
     return DivideUsable(transitions);
 }
 
-// The features of the centres, scaled for comparison.
-INLINED void ReadCentreFeatures(IMAGE_PARAMETERS, Ints columns, int row, Centre* centre) {
-    centre->normal_usable = ReadNormals(normalsBuff, columns, row, &centre->normal);
-    const Pixels n = centre->normal;
-    const Floats scale = 1.0f / sqrt(max(n.x * n.x + n.y * n.y + n.z * n.z, 1e-36f));
-    centre->normal.x *= scale;
-    centre->normal.y *= scale;
-    centre->normal.z *= scale;
-    centre->depth_usable = ReadDepths(depthBuff, columns, row, &centre->depth);
-    centre->transition_usable = ReadTransitions(transBuff, columns, row, &centre->transition);
-}
-
 // Depths beside the centre, its own where they are unusable.
 INLINED Floats DepthBeside(srcBufferType(depthBuff), Ints columns, int row, Floats centre_depth) {
     Floats depths;
@@ -131,9 +128,8 @@ INLINED Floats DepthBeside(srcBufferType(depthBuff), Ints columns, int row, Floa
 }
 
 // Gradient of the depth with the Sobel weights.
-INLINED void DepthGradient(srcBufferType(depthBuff), int2 size, Ints columns, int row, Floats centre_depth,
-                           Floats* along_x, Floats* along_y) {
-    *along_x = *along_y = (Floats)(0.0f);
+INLINED void FindSlope(srcBufferType(depthBuff), int2 size, Ints columns, int row, Centre* centre) {
+    centre->slope_x = centre->slope_y = (Floats)(0.0f);
     if (IS_ABSENT(depthBuff)) {
         return;
     }
@@ -141,11 +137,11 @@ INLINED void DepthGradient(srcBufferType(depthBuff), int2 size, Ints columns, in
     const Ints right = ReflectColumns(columns + 1, size.x);
     for (int j = -1; j <= 1; ++j) {
         const int at = ReflectRow(row + j, size.y);
-        const Floats a = DepthBeside(depthBuff, left, at, centre_depth);
-        const Floats b = DepthBeside(depthBuff, columns, at, centre_depth);
-        const Floats c = DepthBeside(depthBuff, right, at, centre_depth);
-        *along_x += (float)(2 - j * j) * (a - c);
-        *along_y -= (float)j * (a + 2.0f * b + c);
+        const Floats a = DepthBeside(depthBuff, left, at, centre->depth);
+        const Floats b = DepthBeside(depthBuff, columns, at, centre->depth);
+        const Floats c = DepthBeside(depthBuff, right, at, centre->depth);
+        centre->slope_x += (float)((2 - j * j) * offset) * (a - c);
+        centre->slope_y -= (float)(j * offset) * (a + 2.0f * b + c);
     }
 }
 
@@ -202,47 +198,108 @@ INLINED Ints ReadColors(IMAGE_PARAMETERS, int2 size, Ints columns, int row, Pixe
 #endif
 }
 
-// Exponent of the features' weights, 0 and less; which taps have usable features like the centre or unusable ones like
-// it.
-INLINED Floats FeatureExponent(IMAGE_PARAMETERS, const Centre* centre, Ints columns, int row, Floats depth_factor,
-                               Ints* comparable) {
+INLINED void ReadCentre(IMAGE_PARAMETERS, int2 size, Ints columns, int row, float color_sigma, Centre* centre) {
+    centre->color_usable = ReadColors(IMAGES, size, columns, row, &centre->color, &centre->variance);
+#ifdef FIRST_LEVEL
+    const Floats blurred = BlurredVariance(vColorBuff, size, columns, row);
+#else
+    const Floats blurred = max(centre->variance, 0.0f);
+#endif
+    centre->color_factor = ZeroUnless(centre->color_usable, -LOG2_E / (color_sigma * sqrt(blurred) + 0.00001f));
+    centre->normal_usable = ReadNormals(normalsBuff, columns, row, &centre->normal);
+    const Pixels n = centre->normal;
+    const Floats scale = 1.0f / sqrt(max(n.x * n.x + n.y * n.y + n.z * n.z, 1e-36f));
+    centre->normal.x *= scale;
+    centre->normal.y *= scale;
+    centre->normal.z *= scale;
+    centre->depth_usable = ReadDepths(depthBuff, columns, row, &centre->depth);
+    FindSlope(depthBuff, size, columns, row, centre);
+    centre->transition_usable = ReadTransitions(transBuff, columns, row, &centre->transition);
+}
+
+// Exponent of the features' weights, 0 and less, of the taps (i, j) steps away; which taps have usable features like
+// the centre or unusable ones like it.
+INLINED Floats FeatureExponent(IMAGE_PARAMETERS, const Centre* centre, const Sigmas* sigmas, int i, int j, Ints columns,
+                               int row, Ints* comparable) {
     Floats exponent = (Floats)(0.0f);
     *comparable = (Ints)(-1);
     if (!IS_ABSENT(normalsBuff)) {
         Pixels n;
         const Ints usable = ReadNormals(normalsBuff, columns, row, &n);
-        const Floats product = n.x * centre->normal.x + n.y * centre->normal.y + n.z * centre->normal.z;
-        const Floats cosine = product * InverseRoot(min(n.x * n.x + n.y * n.y + n.z * n.z, 1e36f));
-        *comparable &= Same(usable, centre->normal_usable) & Exceeds(cosine, 1e-36f);
-        exponent += LOG2(max(cosine, 1e-36f)) * centre->normal_factor;
+        // The cosine's square, which is 1 for normals that are the same.
+        const Floats product = max(n.x * centre->normal.x + n.y * centre->normal.y + n.z * centre->normal.z, 0.0f);
+        const Floats square = product * product / max(n.x * n.x + n.y * n.y + n.z * n.z, 1e-36f);
+        *comparable &= Same(usable, centre->normal_usable) & Exceeds(square, 1e-36f);
+        exponent += LOG2(clamp(square, 1e-36f, 1.0f)) * (0.5f / fmax(sigmas->normal, 1e-15f));
     }
     if (!IS_ABSENT(depthBuff)) {
         Floats depth;
         *comparable &= Same(ReadDepths(depthBuff, columns, row, &depth), centre->depth_usable);
-        exponent += fabs(depth - centre->depth) * depth_factor;
+        const Floats slope = fabs(centre->slope_x * (float)i + centre->slope_y * (float)j);
+        exponent -= fabs(depth - centre->depth) * (LOG2_E / (sigmas->depth * slope + 0.001f));
     }
     if (!IS_ABSENT(transBuff)) {
         Pixels transition;
         *comparable &= Same(ReadTransitions(transBuff, columns, row, &transition), centre->transition_usable);
-        exponent += Distance(&transition, &centre->transition) * centre->transition_factor;
+        exponent -= Distance(&transition, &centre->transition) * (LOG2_E / fmax(sigmas->transition, 1e-15f));
     }
     return exponent;
 }
 
-INLINED void AddTap(IMAGE_PARAMETERS, const Centre* centre, int2 size, Ints columns, int row, float spline,
-                    Floats depth_factor, Sums* sums) {
+// Adds the taps (i, j) steps away.
+INLINED void AddTap(IMAGE_PARAMETERS, const Centre* centre, const Sigmas* sigmas, int2 size, int i, int j, Ints columns,
+                    int row, Sums* sums) {
     Pixels color;
     Floats variance;
     Ints comparable;
     const Ints usable = ReadColors(IMAGES, size, columns, row, &color, &variance);
-    Floats exponent = FeatureExponent(IMAGES, centre, columns, row, depth_factor, &comparable);
+    Floats exponent = FeatureExponent(IMAGES, centre, sigmas, i, j, columns, row, &comparable);
     exponent += Distance(&color, &centre->color) * centre->color_factor;
+    const float spline = kSpline[abs(i)] * kSpline[abs(j)];
     const Floats weight = ZeroUnless(usable & comparable, spline * EXP2(max(exponent, -126.0f)));
     sums->x += color.x * weight;
     sums->y += color.y * weight;
     sums->z += color.z * weight;
     sums->variance += variance * weight * weight;
     sums->weight += weight;
+}
+
+// The pixels from `at` on.
+INLINED void FilterAt(IMAGE_PARAMETERS, const Sigmas* sigmas, dstBufferType(dstBuffer), int2 size, int2 at) {
+    Centre centre;
+    ReadCentre(IMAGES, size, min(at.x + LANE_NUMBERS, (Ints)(size.x - 1)), at.y, sigmas->color, &centre);
+    // The centre itself, at full likeness.
+    const Floats own_weight = ZeroUnless(centre.color_usable, (Floats)(kSpline[0] * kSpline[0]));
+    Sums sums;
+    sums.x = centre.color.x * own_weight;
+    sums.y = centre.color.y * own_weight;
+    sums.z = centre.color.z * own_weight;
+    sums.variance = centre.variance * own_weight * own_weight;
+    sums.weight = own_weight;
+    for (int i = -2; i <= 2; ++i) {
+        const Ints columns = ReflectColumns(at.x + LANE_NUMBERS + i * offset, size.x);
+        for (int j = -2; j <= 2; ++j) {
+            if (i != 0 || j != 0) {
+                const int row = ReflectRow(at.y + j * offset, size.y);
+                AddTap(IMAGES, &centre, sigmas, size, i, j, columns, row, &sums);
+            }
+        }
+    }
+    // Without the centre's weight nothing may be left: then a later level, with wider steps, fills the pixel.
+    const Ints any = Exceeds(sums.weight, 1e-20f);
+    const Floats inverse = ZeroUnless(any, 1.0f / max(sums.weight, 1e-20f));
+    const float largest = LARGEST(dstBuffer);
+    const Floats x = clamp(sums.x * inverse, -largest, largest);
+    const Floats y = clamp(sums.y * inverse, -largest, largest);
+    const Floats z = clamp(sums.z * inverse, -largest, largest);
+    const Floats filtered = min(sums.variance * inverse * inverse, 1e30f);
+    const Floats variance = AS_FLOATS((AS_INTS(filtered) & any) | (AS_INTS((Floats)(UNFILLED)) & ~any));
+#define STORE(k)                                                                                   \
+    if (at.x + k < size.x) {                                                                       \
+        slots[VarianceIndex(size, at.x + k, at.y) + WRITE_SLOT] = LANE(variance, k);               \
+        WritePixel(dstBuffer, at.x + k, at.y, (float4)(LANE(x, k), LANE(y, k), LANE(z, k), 1.0f)); \
+    }
+    FOR_EACH_LANE(STORE)
 }
 
 __kernel void EAWDenoiserKernel(srcBufferType(srcBuffer), srcBufferType(normalsBuff), srcBufferType(depthBuff),
@@ -256,57 +313,10 @@ __kernel void EAWDenoiserKernel(srcBufferType(srcBuffer), srcBufferType(normalsB
     }
     // Neighbours read one float of a pair while its owner writes the other: single floats, never whole pairs.
     __global float* slots = (__global float*)variance;
-
-    const Ints columns = min(coord.x + LANE_NUMBERS, (Ints)(size.x - 1));
-    Centre centre;
-    Floats own_variance;
-    const Ints color_usable = ReadColors(IMAGES, size, columns, coord.y, &centre.color, &own_variance);
-#ifdef FIRST_LEVEL
-    const Floats blurred = BlurredVariance(vColorBuff, size, columns, coord.y);
-#else
-    const Floats blurred = max(own_variance, 0.0f);
-#endif
-    ReadCentreFeatures(IMAGES, columns, coord.y, &centre);
-    centre.color_factor = ZeroUnless(color_usable, -LOG2_E / (colSigma * sqrt(blurred) + 0.00001f));
-    centre.normal_factor = 1.0f / fmax(normSigma, 1e-15f);
-    centre.transition_factor = -LOG2_E / fmax(transSigma, 1e-15f);
-    Floats slope_x;
-    Floats slope_y;
-    DepthGradient(depthBuff, size, columns, coord.y, centre.depth, &slope_x, &slope_y);
-    slope_x *= (float)offset;
-    slope_y *= (float)offset;
-
-    Sums sums;
-    sums.x = sums.y = sums.z = sums.variance = sums.weight = (Floats)(0.0f);
-    for (int i = -2; i <= 2; ++i) {
-        const Ints tap_columns = ReflectColumns(coord.x + LANE_NUMBERS + i * offset, size.x);
-        for (int j = -2; j <= 2; ++j) {
-            if (i != 0 || j != 0) {
-                const Floats slope = fabs(slope_x * (float)i + slope_y * (float)j);
-                const Floats depth_factor = -LOG2_E / (dptSigma * slope + 0.001f);
-                AddTap(IMAGES, &centre, size, tap_columns, ReflectRow(coord.y + j * offset, size.y),
-                       kSpline[abs(i)] * kSpline[abs(j)], depth_factor, &sums);
-            }
-        }
-    }
-
-    // The centre itself, at full likeness.
-    const Floats own_weight = ZeroUnless(color_usable, (Floats)(kSpline[0] * kSpline[0]));
-    const Floats weight_sum = sums.weight + own_weight;
-    const Floats variance_sum = sums.variance + own_variance * own_weight * own_weight;
-    // Without the centre's weight nothing may be left: then a later level, with wider steps, fills the pixel.
-    const Ints any = Exceeds(weight_sum, 1e-20f);
-    const Floats inverse = ZeroUnless(any, 1.0f / max(weight_sum, 1e-20f));
-    const float largest = LARGEST(dstBuffer);
-    const Floats x = clamp((sums.x + centre.color.x * own_weight) * inverse, -largest, largest);
-    const Floats y = clamp((sums.y + centre.color.y * own_weight) * inverse, -largest, largest);
-    const Floats z = clamp((sums.z + centre.color.z * own_weight) * inverse, -largest, largest);
-    const Floats filtered = min(variance_sum * inverse * inverse, 1e30f);
-    const Floats stored = AS_FLOATS((AS_INTS(filtered) & any) | (AS_INTS((Floats)(UNFILLED)) & ~any));
-#define STORE(k)                                                                                         \
-    if (coord.x + k < size.x) {                                                                          \
-        slots[VarianceIndex(size, coord.x + k, coord.y) + WRITE_SLOT] = LANE(stored, k);                 \
-        WritePixel(dstBuffer, coord.x + k, coord.y, (float4)(LANE(x, k), LANE(y, k), LANE(z, k), 1.0f)); \
-    }
-    FOR_EACH_LANE(STORE)
+    Sigmas sigmas;
+    sigmas.color = colSigma;
+    sigmas.normal = normSigma;
+    sigmas.depth = dptSigma;
+    sigmas.transition = transSigma;
+    FilterAt(IMAGES, &sigmas, dstBuffer, size, coord);
 }

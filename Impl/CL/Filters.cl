@@ -66,7 +66,7 @@ __kernel void LinearToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(ds
 // ---- Kernels that stand here twice ---------------------------------------------------------------------------------
 //
 // The first, one pixel per item, keeps to the form in which it can be fused, and fusion takes it from the text wherever
-// it runs. The second is for central processors: an item in eight takes the pixels of all eight side by side.
+// it runs. The second is for central processors: an item in 64 takes the pixels of all, eight side by side.
 
 #if !ON_CENTRAL_PROCESSOR
 
@@ -173,8 +173,8 @@ INLINED float16 GammaOf4(float16 pixels, float gamma) {
 }
 
 __kernel void GammaCorrectionKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cGamma) {
-    SHADE_ROW(left = GammaOf4(left, cGamma);
-              right = GammaOf4(right, cGamma))
+    SHADE_ROWS(left = GammaOf4(left, cGamma);
+               right = GammaOf4(right, cGamma))
 }
 
 INLINED float16 SimpleToneOf4(float16 pixels, float exposure, float contrast, bool curved) {
@@ -184,22 +184,22 @@ INLINED float16 SimpleToneOf4(float16 pixels, float exposure, float contrast, bo
 
 __kernel void SimpleToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cExposure,
                                       float cContrast, int cApplyToneMap) {
-    SHADE_ROW(left = SimpleToneOf4(left, cExposure, cContrast, cApplyToneMap != 0);
-              right = SimpleToneOf4(right, cExposure, cContrast, cApplyToneMap != 0))
+    SHADE_ROWS(left = SimpleToneOf4(left, cExposure, cContrast, cApplyToneMap != 0);
+               right = SimpleToneOf4(right, cExposure, cContrast, cApplyToneMap != 0))
 }
 
 __kernel void ReinhardToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cKey,
                                         float cWPoint, float cBurn) {
-    SHADE_ROW(const float8 factors = ReinhardScaleOf8(LuminancesOf8(left, right), cKey, cWPoint, cBurn);
-              left = ScaleColors(left, factors.lo);
-              right = ScaleColors(right, factors.hi))
+    SHADE_ROWS(const float8 factors = ReinhardScaleOf8(LuminancesOf8(left, right), cKey, cWPoint, cBurn);
+               left = ScaleColors(left, factors.lo);
+               right = ScaleColors(right, factors.hi))
 }
 
 __kernel void DragoToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cBias,
                                      float avLum, float maxLum) {
-    SHADE_ROW(const float8 factors = DragoScaleOf8(LuminancesOf8(left, right), cBias, avLum, maxLum);
-              left = ScaleColors(left, factors.lo);
-              right = ScaleColors(right, factors.hi))
+    SHADE_ROWS(const float8 factors = DragoScaleOf8(LuminancesOf8(left, right), cBias, avLum, maxLum);
+               left = ScaleColors(left, factors.lo);
+               right = ScaleColors(right, factors.hi))
 }
 
 INLINED float16 ExposedOf4(float16 pixels, float exposure, float intensity) {
@@ -209,47 +209,55 @@ INLINED float16 ExposedOf4(float16 pixels, float exposure, float intensity) {
 
 __kernel void ExponentialToneMappingKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), float cExposure,
                                            float cIntensity) {
-    SHADE_ROW(left = ExposedOf4(left, cExposure, cIntensity);
-              right = ExposedOf4(right, cExposure, cIntensity))
+    SHADE_ROWS(left = ExposedOf4(left, cExposure, cIntensity);
+               right = ExposedOf4(right, cExposure, cIntensity))
 }
 
-#define SOBEL_SIDE 8
-#define SOBEL_REACH (SOBEL_SIDE + 2)
+// Of eight pixels of a row: the differences of the luminances on both sides, and the sums, weighted 1, 2, 1.
+INLINED void CompareLuminances(srcBufferType(srcBuffer), int2 at, int count, int last, float8* differences,
+                               float8* sums) {
+    float16 left;
+    float16 right;
+    ReadEight(srcBuffer, at, count, &left, &right);
+    const float8 own = LuminancesOf8(left, right);
+    const float8 before = (float8)(Luminance(ReadPixel(srcBuffer, max(at.x - 1, 0), at.y)), own.s0123, own.s456);
+    const float8 behind = (float8)(own.s1234, own.s567, Luminance(ReadPixel(srcBuffer, min(at.x + 8, last), at.y)));
+    *differences = behind - before;
+    *sums = before + 2.0f * own + behind;
+}
 
+#define SOBEL_EIGHTS 8
+#define SOBEL_ROWS 8
+
+// An item takes a block of 64 columns and 8 rows, row after row, and keeps what it found in two rows for the next.
 __kernel void SobelOperatorKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer)) {
-    const int2 last = GET_BUFFER_SIZE(dstBuffer) - 1;
+    const int2 size = GET_BUFFER_SIZE(dstBuffer);
     const int2 corner = (int2)((int)get_global_id(0), (int)get_global_id(1));
-    if (corner.x % SOBEL_SIDE != 0 || corner.y % SOBEL_SIDE != 0 || corner.x > last.x || corner.y > last.y) {
+    if (corner.x % (8 * SOBEL_EIGHTS) != 0 || corner.y % SOBEL_ROWS != 0 || corner.x >= size.x || corner.y >= size.y) {
         return;
     }
-    // Of the block and one pixel around it.
-    float luminances[SOBEL_REACH][SOBEL_REACH];
-    for (int j = 0; j < SOBEL_REACH; ++j) {
-        const int row = clamp(corner.y + j - 1, 0, last.y);
-        for (int i = 0; i < SOBEL_REACH; ++i) {
-            luminances[j][i] = Luminance(ReadPixel(srcBuffer, clamp(corner.x + i - 1, 0, last.x), row));
-        }
-    }
-    // Differences and sums along each row; the gradient's two parts are sums and differences of those.
-    float8 differences[SOBEL_REACH];
-    float8 sums[SOBEL_REACH];
-    for (int j = 0; j < SOBEL_REACH; ++j) {
-        const float8 left = vload8(0, luminances[j]);
-        const float8 middle = vload8(0, luminances[j] + 1);
-        const float8 right = vload8(0, luminances[j] + 2);
-        differences[j] = right - left;
-        sums[j] = left + 2.0f * middle + right;
-    }
-    const int columns = min(SOBEL_SIDE, last.x + 1 - corner.x);
-    const int rows = min(SOBEL_SIDE, last.y + 1 - corner.y);
-    for (int j = 0; j < rows; ++j) {
-        const float8 horizontal = differences[j] + 2.0f * differences[j + 1] + differences[j + 2];
-        const float8 vertical = sums[j] - sums[j + 2];
-        float magnitudes[SOBEL_SIDE];
-        vstore8(sqrt(horizontal * horizontal + vertical * vertical), 0, magnitudes);
-        for (int i = 0; i < columns; ++i) {
-            const float4 result = (float4)(magnitudes[i], magnitudes[i], magnitudes[i], 1.0f);
-            WritePixel(dstBuffer, corner.x + i, corner.y + j, result);
+    float8 differences[2][SOBEL_EIGHTS];
+    float8 sums[2][SOBEL_EIGHTS];
+    const int eights = min(SOBEL_EIGHTS, (size.x - 1 - corner.x) / 8 + 1);
+    const int rows = min(SOBEL_ROWS, size.y - corner.y);
+    for (int j = -1; j <= rows; ++j) {
+        const int row = clamp(corner.y + j, 0, size.y - 1);
+        const int slot = j & 1;
+        for (int k = 0; k < eights; ++k) {
+            const int x = corner.x + 8 * k;
+            const int count = min(8, size.x - x);
+            float8 difference;
+            float8 sum;
+            CompareLuminances(srcBuffer, (int2)(x, row), count, size.x - 1, &difference, &sum);
+            if (j > 0) {
+                const float8 horizontal = differences[slot][k] + 2.0f * differences[1 - slot][k] + difference;
+                const float8 vertical = sums[slot][k] - sum;
+                const float8 lengths = native_sqrt(horizontal * horizontal + vertical * vertical);
+                WriteEight(dstBuffer, (int2)(x, corner.y + j - 1), count, Opaque(lengths.lo.s0000111122223333),
+                           Opaque(lengths.hi.s0000111122223333));
+            }
+            differences[slot][k] = difference;
+            sums[slot][k] = sum;
         }
     }
 }
@@ -266,9 +274,9 @@ INLINED float8 ShadowMatteOf8(float16 left, float16 right) {
 }
 
 __kernel void ShadowCatcherKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer)) {
-    SHADE_ROW(const float8 mattes = ShadowMatteOf8(left, right);
-              left = Opaque(mattes.lo.s0000111122223333);
-              right = Opaque(mattes.hi.s0000111122223333))
+    SHADE_ROWS(const float8 mattes = ShadowMatteOf8(left, right);
+               left = Opaque(mattes.lo.s0000111122223333);
+               right = Opaque(mattes.hi.s0000111122223333))
 }
 
 #endif

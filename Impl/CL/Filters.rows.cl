@@ -1,4 +1,4 @@
-// Rows of eight pixels: on central processors one item in eight takes the pixels of all eight, side by side in vectors.
+// Rows of eight pixels: on central processors one item in 64 takes the pixels of all, eight side by side in vectors.
 #if ON_CENTRAL_PROCESSOR
 
 // ReadFour(buffer, x, y) and WriteFour(buffer, x, y, rgba): four neighbouring pixels, RGBA after RGBA.
@@ -61,29 +61,62 @@ INLINED void WriteFour_float_4(__global float4* buffer, int2 bufferSize, int x, 
 #define WriteFour(buffer, x, y, rgba) \
     WriteFour_(buffer##_COMP_TYPE, buffer##_COMP_NUM, buffer, buffer##_Res, x, y, rgba)
 
-// The body of a kernel that computes each pixel of dstBuffer from the same of srcBuffer. The statements `shade` find
-// eight pixels in left and right, RGBA after RGBA, and leave the results there. Where a row ends with fewer than eight,
-// they are shaded one by one.
-#define SHADE_ROW(shade)                                                     \
-    const int2 size = GET_BUFFER_SIZE(dstBuffer);                            \
-    const int2 first = (int2)((int)get_global_id(0), (int)get_global_id(1)); \
-    if (first.x % 8 != 0 || first.x >= size.x || first.y >= size.y) {        \
-        return;                                                              \
-    }                                                                        \
-    if (first.x + 8 <= size.x) {                                             \
-        float16 left = ReadFour(srcBuffer, first.x, first.y);                \
-        float16 right = ReadFour(srcBuffer, first.x + 4, first.y);           \
-        shade;                                                               \
-        WriteFour(dstBuffer, first.x, first.y, left);                        \
-        WriteFour(dstBuffer, first.x + 4, first.y, right);                   \
-        return;                                                              \
-    }                                                                        \
-    for (int x = first.x; x < size.x; ++x) {                                 \
-        const float4 pixel = ReadPixel(srcBuffer, x, first.y);               \
-        float16 left = (float16)(pixel, pixel, pixel, pixel);                \
-        float16 right = left;                                                \
-        shade;                                                               \
-        WritePixel(dstBuffer, x, first.y, left.lo.lo);                       \
+// Where the eight pixels numbered k of the item at the corner of an 8 x 8 block begin. The item takes as many as the
+// block has, but in the order of the rows: memory is read as it lies. Counted on, y may lie below the picture.
+INLINED int2 EightOfBlock(int2 corner, int2 size, int k) {
+    const int across = (size.x - 1) / 8 + 1;
+    const long eight = 8 * ((long)(corner.y / 8) * across + corner.x / 8) + k;
+    return (int2)(8 * (int)(eight % across), (int)(eight / across));
+}
+
+// Eight pixels of a row, RGBA after RGBA. Only the first `count` lie in the picture: the last of them is repeated.
+INLINED void ReadEight(srcBufferType(srcBuffer), int2 at, int count, float16* left, float16* right) {
+    if (count == 8) {
+        *left = ReadFour(srcBuffer, at.x, at.y);
+        *right = ReadFour(srcBuffer, at.x + 4, at.y);
+        return;
+    }
+    float4 pixels[8];
+    for (int i = 0; i < 8; ++i) {
+        pixels[i] = ReadPixel(srcBuffer, at.x + min(i, count - 1), at.y);
+    }
+    *left = vload16(0, (float*)pixels);
+    *right = vload16(1, (float*)pixels);
+}
+
+INLINED void WriteEight(dstBufferType(dstBuffer), int2 at, int count, float16 left, float16 right) {
+    if (count == 8) {
+        WriteFour(dstBuffer, at.x, at.y, left);
+        WriteFour(dstBuffer, at.x + 4, at.y, right);
+        return;
+    }
+    float4 pixels[8];
+    vstore16(left, 0, (float*)pixels);
+    vstore16(right, 1, (float*)pixels);
+    for (int i = 0; i < count; ++i) {
+        WritePixel(dstBuffer, at.x + i, at.y, pixels[i]);
+    }
+}
+
+// The body of a kernel that computes each pixel of dstBuffer from the same of srcBuffer: the statements `shade` find
+// eight pixels in left and right and leave the results there.
+#define SHADE_ROWS(shade)                                                                     \
+    const int2 size = GET_BUFFER_SIZE(dstBuffer);                                             \
+    const int2 corner = (int2)((int)get_global_id(0), (int)get_global_id(1));                 \
+    if (corner.x % 8 != 0 || corner.y % 8 != 0 || corner.x >= size.x || corner.y >= size.y) { \
+        return;                                                                               \
+    }                                                                                         \
+    for (int k = 0; k < 8; ++k) {                                                             \
+        const int2 at = EightOfBlock(corner, size, k);                                        \
+        if (at.y >= size.y) {                                                                 \
+            return;                                                                           \
+        }                                                                                     \
+        const int count = min(8, size.x - at.x);                                              \
+        float16 left;                                                                         \
+        float16 right;                                                                        \
+        ReadEight(srcBuffer, at, count, &left, &right);                                       \
+        shade;                                                                                \
+        WriteEight(dstBuffer, at, count, left, right);                                        \
     }
 
 INLINED float8 SumsOfPairs(float16 values) {
@@ -111,4 +144,3 @@ INLINED float16 ScaleColors(float16 pixels, float4 factors) {
 }
 
 #endif
-

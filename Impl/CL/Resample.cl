@@ -4,7 +4,7 @@
 // CRATIO_Y, the whole source pixels per output pixel.
 //
 // The kernel stands here twice. The first, one pixel per item, keeps to the form in which it can be fused, and fusion
-// takes it from the text wherever it runs. The second takes blocks of 8 x 8 pixels per item on central processors.
+// takes it from the text wherever it runs. The second takes 64 pixels per item on central processors.
 
 #if INTERPOLATION_OPERATOR >= 0 && INTERPOLATION_OPERATOR <= 2
 #if !ON_CENTRAL_PROCESSOR
@@ -66,6 +66,8 @@ __kernel void ResampleKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer),
 #define BLOCK_SIDE 8
 
 #if INTERPOLATION_OPERATOR == 0
+#define HAS_SMALL_SQUARES (CRATIO_X > 0 && CRATIO_X <= 64 && CRATIO_Y > 0 && CRATIO_Y <= 64)
+
 // Where the source pixels of an output column or row begin; sizes that a host overrides may be of any magnitude.
 static inline int BlockStart(int position, long ratio, int extent) {
     return (int)min((long)position * ratio, (long)extent);
@@ -118,22 +120,47 @@ __kernel void ResampleKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer),
     const int rows = min(BLOCK_SIDE, limits.y - corner.y);
 
 #if INTERPOLATION_OPERATOR == 0
-    for (int y = corner.y; y < corner.y + rows; ++y) {
+    // As many pixels as a block has, in the order of the rows: they share nothing, and the source is read as it lies.
+    const int across = (limits.x - 1) / BLOCK_SIDE + 1;
+    const long block = (long)(corner.y / BLOCK_SIDE) * across + corner.x / BLOCK_SIDE;
+    long place = block * BLOCK_SIDE * BLOCK_SIDE;
+    const long behind = min(place + BLOCK_SIDE * BLOCK_SIDE, (long)limits.x * limits.y);
+    while (place < behind) {
+        const int y = (int)(place / limits.x);
+        const int x = (int)(place % limits.x);
+        const int run = (int)min(behind - place, (long)(limits.x - x));
         const int top = BlockStart(y, CRATIO_Y, extent.y);
         const int below = BlockStart(y + 1, CRATIO_Y, extent.y);
-        for (int x = corner.x; x < corner.x + columns; ++x) {
-            const int left = BlockStart(x, CRATIO_X, extent.x);
-            const int right = BlockStart(x + 1, CRATIO_X, extent.x);
+#if HAS_SMALL_SQUARES
+        if ((long)(x + run) * CRATIO_X <= extent.x && below - top == CRATIO_Y) {
+            // Whole squares: loops of known length.
+            for (int i = x; i < x + run; ++i) {
+                float4 sum = (float4)(0.0f);
+                for (int row = 0; row < CRATIO_Y; ++row) {
+                    for (int column = 0; column < CRATIO_X; ++column) {
+                        sum += ReadPixel(srcBuffer, i * CRATIO_X + column, top + row);
+                    }
+                }
+                WritePixel(dstBuffer, i, y, sum * (1.0f / (CRATIO_X * CRATIO_Y)));
+            }
+            place += run;
+            continue;
+        }
+#endif
+        for (int i = x; i < x + run; ++i) {
+            const int left = BlockStart(i, CRATIO_X, extent.x);
+            const int right = BlockStart(i + 1, CRATIO_X, extent.x);
             const float count = (float)(right - left) * (float)(below - top);
             float4 sum = (float4)(0.0f);
-            for (int j = top; j < below; ++j) {
-                for (int i = left; i < right; ++i) {
-                    sum += ReadPixel(srcBuffer, i, j);
+            for (int row = top; row < below; ++row) {
+                for (int column = left; column < right; ++column) {
+                    sum += ReadPixel(srcBuffer, column, row);
                 }
             }
             const float4 result = count > 0.0f ? sum / count : (float4)(0.0f, 0.0f, 0.0f, 1.0f);
-            WritePixel(dstBuffer, x, y, result);
+            WritePixel(dstBuffer, i, y, result);
         }
+        place += run;
     }
 #else
     // All eight columns are computed: loops of known length. Those behind the picture repeat its last one.
