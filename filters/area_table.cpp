@@ -1,5 +1,6 @@
 #include "filters/area_table.h"
 
+#include <algorithm>
 #include <array>
 
 namespace {
@@ -43,13 +44,13 @@ std::array<uint8_t, 2> areas(size_t firstCrossing, size_t secondCrossing, size_t
     return sides;
 }
 
-std::vector<uint8_t> makeAreaTable() {
-    std::vector<uint8_t> table;
-    table.reserve(kAreaTableBytes);
+std::array<uint8_t, kAreaTableBytes> makeAreaTable() {
+    std::array<uint8_t, kAreaTableBytes> table{};
+    auto next = table.begin();
     for (size_t y = 0; y < kAreaTableSize; ++y) {
         for (size_t x = 0; x < kAreaTableSize; ++x) {
             const auto sides = areas(x / kAreaBlockSize, y / kAreaBlockSize, x % kAreaBlockSize, y % kAreaBlockSize);
-            table.insert(table.end(), sides.begin(), sides.end());
+            next = std::copy(sides.begin(), sides.end(), next);
         }
     }
     return table;
@@ -57,7 +58,7 @@ std::vector<uint8_t> makeAreaTable() {
 
 }  // namespace
 
-const std::vector<uint8_t>& areaTable() {
-    static const std::vector<uint8_t> table = makeAreaTable();
+std::span<const uint8_t> areaTable() {
+    static const std::array<uint8_t, kAreaTableBytes> table = makeAreaTable();
     return table;
 }

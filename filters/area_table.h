@@ -3,14 +3,14 @@
 
 #include <cstddef>
 #include <cstdint>
-#include <vector>
+#include <span>
 
 // A square of 5 x 5 blocks of 33 x 33 texels of two bytes, row after row: 54,450 bytes. Block column and row are four
 // times the crossing-edge value at the line's first and second end; inside a block, column and row are the distances
 // to those ends in pixels. The two channels are the areas of the pixel's own and the opposite side, times 255.
 // After A. Reshetov, "Morphological Antialiasing", High Performance Graphics 2009, in the form of J. Jimenez et al.,
 // "Practical Morphological Anti-Aliasing", GPU Pro 2, 2011.
-const std::vector<uint8_t>& areaTable();
+std::span<const uint8_t> areaTable();
 
 inline constexpr size_t kAreaBlocks = 5;
 inline constexpr size_t kAreaBlockSize = 33;

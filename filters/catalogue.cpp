@@ -349,7 +349,8 @@ std::array<FilterSpec, kFilterTypes> makeCatalogue() {
 }  // namespace
 
 const FilterSpec& filterSpec(uint32_t type) {
-    static const std::array<FilterSpec, kFilterTypes> catalogue = makeCatalogue();
+    // Never destroyed: filters keep their rows, and hosts make and run filters in their own exit handlers, too.
+    static const auto& catalogue = *new std::array<FilterSpec, kFilterTypes>(makeCatalogue());
     if (type >= catalogue.size()) throw TovException{TOV_ERROR_INVALID_OPERATION};
     return catalogue[type];
 }

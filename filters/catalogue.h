@@ -4,6 +4,7 @@
 #include <array>
 #include <cstddef>
 #include <cstdint>
+#include <span>
 #include <vector>
 
 #include "api/tov/types.h"
@@ -82,7 +83,7 @@ struct FilterSpec {
     uint32_t stateBytesPerPixel = 0;    // of dstBuffer
     // Contents of a state buffer that is created with the filter; with null contents it starts as one zero byte.
     bool hasState = false;
-    const std::vector<uint8_t>& (*stateContents)() = nullptr;
+    std::span<const uint8_t> (*stateContents)() = nullptr;
     InPlace inPlace = InPlace::PrivateCopy;
     SizeRule sizeRule = SizeRule::CoverOutput;
     bool readsOutputBack = false;  // see PassItemKind::ReadBack

@@ -6,17 +6,17 @@ namespace {
 
 constexpr Chromaticity kD65 = {0.3127f, 0.329f, 0.3583f};
 
-const std::vector<TovColorSpaceGamut> gamutTable = {
+constexpr std::array<TovColorSpaceGamut, 4> kGamuts = {{
     {{0.64f, 0.33f, 0.03f}, {0.30f, 0.60f, 0.10f}, {0.15f, 0.06f, 0.79f}, kD65},        // sRGB
     {{0.64f, 0.33f, 0.03f}, {0.21f, 0.71f, 0.08f}, {0.15f, 0.06f, 0.79f}, kD65},        // Adobe RGB
     {{0.708f, 0.292f, 0.0f}, {0.17f, 0.797f, 0.033f}, {0.131f, 0.046f, 0.823f}, kD65},  // Rec. 2020
     {{0.68f, 0.32f, 0.0f}, {0.265f, 0.69f, 0.045f}, {0.15f, 0.06f, 0.79f}, kD65},       // DCI-P3
-};
+}};
 
 }  // namespace
 
-const std::vector<TovColorSpaceGamut>& gamuts() noexcept {
-    return gamutTable;
+std::span<const TovColorSpaceGamut> gamuts() noexcept {
+    return kGamuts;
 }
 
 Matrix3 rgbToXyz(const TovColorSpaceGamut& gamut) noexcept {

@@ -3,7 +3,7 @@
 
 #include <array>
 #include <cstddef>
-#include <vector>
+#include <span>
 
 namespace ColorTools {
 
@@ -17,7 +17,7 @@ struct TovColorSpaceGamut {
 };
 
 // Indexed by colour-space value - 1.
-const std::vector<TovColorSpaceGamut>& gamuts() noexcept;
+std::span<const TovColorSpaceGamut> gamuts() noexcept;
 
 using Matrix3 = std::array<float, 9>;  // row after row
 

@@ -72,7 +72,7 @@ ColorSpaceConvertor::ColorSpaceConvertor(TovFilterParameter& colorSpace, Directi
 void ColorSpaceConvertor::SetKernelArgument(zor::Launcher& launcher) {
     requireType(*parameter_, TOV_PARAMETER_TYPE_UINT1);
     const uint32_t index = parameter_->asUint() - 1;
-    const auto& gamuts = ColorTools::gamuts();
+    const auto gamuts = ColorTools::gamuts();
     if (index >= gamuts.size())
         refuse(TOV_ERROR_INVALID_PARAMETER, std::string(parameter_->name()) + " is " +
                                                 std::to_string(parameter_->asUint()) +

@@ -70,7 +70,7 @@ void createState(TovImageFilter& filter) {
     const FilterSpec& spec = filter.spec();
     if (!spec.hasState) return;
     if (spec.stateContents == nullptr) return filter.createStateBuffer(nullptr, 1);
-    const std::vector<uint8_t>& contents = spec.stateContents();
+    const std::span<const uint8_t> contents = spec.stateContents();
     filter.createStateBuffer(contents.data(), contents.size());
 }
 

@@ -109,7 +109,8 @@ void ParseKernel(TovKernelCode& code, const std::string& kernelName, std::string
 }
 
 const TovKernelCode& embeddedKernelCode(const std::string& sourceName, const std::string& kernelName) {
-    static std::map<std::pair<std::string, std::string>, TovKernelCode> parsed;
+    // Never destroyed: hosts make and run filters in their own exit handlers, too.
+    static auto& parsed = *new std::map<std::pair<std::string, std::string>, TovKernelCode>;
     const std::pair key(sourceName, kernelName);
     if (const auto known = parsed.find(key); known != parsed.end()) return known->second;
     TovKernelCode code;

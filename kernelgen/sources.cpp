@@ -1,7 +1,5 @@
 #include "kernelgen/sources.h"
 
-#include <map>
-
 extern const char kFiltersSource[];
 extern const char kBilateralDenoiserSource[];
 extern const char kResampleSource[];
@@ -17,7 +15,11 @@ const std::string_view kKernelDirectory = "../Tovkit/Impl/CL/";
 
 namespace {
 
-const std::map<std::string_view, std::string_view> kernelSources = {
+struct KernelSource {
+    std::string_view name;
+    const char* text;
+};
+constexpr KernelSource kKernelSources[] = {
     {"Filters", kFiltersSource},
     {"BilateralDenoiser", kBilateralDenoiserSource},
     {"Resample", kResampleSource},
@@ -32,8 +34,9 @@ const std::map<std::string_view, std::string_view> kernelSources = {
 }  // namespace
 
 std::string_view findKernelSource(std::string_view sourceName) noexcept {
-    const auto source = kernelSources.find(sourceName);
-    return source == kernelSources.end() ? std::string_view{} : source->second;
+    for (const KernelSource& source : kKernelSources)
+        if (source.name == sourceName) return source.text;
+    return {};
 }
 
 std::string_view commonKernelSource() noexcept {

@@ -73,10 +73,10 @@ std::string carrierPath() {
 #endif
 
 // The library file that carries this code. Its name may be relative to the directory that the host was in when it
-// loaded us, so it is resolved then.
-const std::string libraryFile = [] {
+// loaded us, so it is resolved then. Never destroyed: hosts call in their own exit handlers, too.
+const std::string& libraryFile = *[] {
     std::error_code error;
-    return std::filesystem::absolute(carrierPath(), error).string();
+    return new std::string(std::filesystem::absolute(carrierPath(), error).string());
 }();
 
 // 0 when the path is a file that can be read, otherwise the system's error. Pipes and devices, which could block, are

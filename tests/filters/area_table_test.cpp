@@ -9,7 +9,7 @@ namespace {
 
 std::array<int, 2> texel(size_t column, size_t row, size_t first, size_t second) {
     const size_t at = 2 * (kAreaBlockSize * column + first + kAreaTableSize * (kAreaBlockSize * row + second));
-    return {areaTable().at(at), areaTable().at(at + 1)};
+    return {areaTable()[at], areaTable()[at + 1]};
 }
 
 }  // namespace
