@@ -199,9 +199,10 @@ TOV_API int32_t tovContextCreateImageFilter(tov_context context, uint32_t filter
  * input and output that the filter works on, until the next binding.
  *
  * @return TOV_ERROR_INVALID_FILTER; TOV_ERROR_INVALID_PARAMETER_NAME: name is null; TOV_ERROR_INVALID_PARAMETER:
- * matrix, or values or images with a non-zero count, is null, an image array has more than 64 elements, or one of them
- *         is neither null nor a live image or filter; TOV_ERROR_INVALID_PARAMETER_NAME: the filter has no such
- *         parameter; TOV_ERROR_UNSUPPORTED: the parameter has another type.
+ *         matrix, or values or images with a non-zero count, is null, an image array has more than 64 elements, one
+ *         of them is neither null nor a live image or filter, or is a filter that would feed itself;
+ *         TOV_ERROR_INVALID_PARAMETER_NAME: the filter has no such parameter; TOV_ERROR_UNSUPPORTED: the parameter has
+ *         another type.
  */
 TOV_API int32_t tovImageFilterSetParameter1u(tov_image_filter filter, const char* name, uint32_t x);
 TOV_API int32_t tovImageFilterSetParameter2u(tov_image_filter filter, const char* name, uint32_t x, uint32_t y);
@@ -287,6 +288,7 @@ TOV_API int32_t tovCommandQueueDetachImageFilter(tov_command_queue queue, tov_im
  * @return TOV_ERROR_INVALID_CONTEXT; TOV_ERROR_INVALID_QUEUE; otherwise the first failure: a deleted filter, image or
  *         context gives its own code; TOV_ERROR_INVALID_PARAMETER: a value that the filter cannot work with;
  *         TOV_ERROR_INVALID_OPERATION: an image that is missing, too small or of unknown layout;
+ *         TOV_ERROR_UNSUPPORTED: filters that cannot be fused, or an OpenCL image where only a buffer will do;
  *         TOV_ERROR_INTERNAL_ERROR: no memory, a kernel that does not compile, a driver's refusal. A line on standard
  *         output says what was wrong.
  */
