@@ -64,6 +64,8 @@ void requireUsable(const Binding& binding, const DevicePointer& device) {
     if (image.device() != device) refuseImage(binding, "belongs to another context than the filter");
     if (componentBytes(desc.type) == 0) refuseImage(binding, "has an unknown component type");
     if (desc.num_components < 1 || desc.num_components > 4) refuseImage(binding, "must have 1 to 4 components");
+    if (image.width() == 0 || image.height() == 0)
+        refuse(TOV_ERROR_INVALID_PARAMETER, std::string(binding.parameter->name()) + " has a width or height of 0");
     if (image.width() > kMaxSide || image.height() > kMaxSide) refuseImage(binding, "is too wide or too high");
     if (!image.hasStorage()) refuseImage(binding, "has no storage");
     // Kernels address rows of exactly the width, so a smaller row pitch leaves the last rows without storage.
@@ -117,6 +119,10 @@ void checkImages(const FilterTree& tree) {
     }
     const std::vector<Binding> bindings = boundImages(tree);
     const TovImage& output = *root.filter->find("dstBuffer")->boundImage();
+    // Later passes read around their pixels what earlier ones have written.
+    const Size part = root.filter->find("dstBufferSize")->asSize();
+    if (root.filter->spec().passes.size() > 1 && (part[0] < output.width() || part[1] < output.height()))
+        refuse(TOV_ERROR_INVALID_PARAMETER, "dstRec of a filter of several passes must cover the output");
     for (const Binding& binding : bindings) requireUsable(binding, root.filter->device());
     for (const Binding& binding : bindings) requireSize(binding);
     for (const Binding& binding : bindings)

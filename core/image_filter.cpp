@@ -60,7 +60,7 @@ TovFilterParameter& TovImageFilter::addParameter(const ParameterSpec& spec) {
 }
 
 TovFilterPass& TovImageFilter::addPass(const char* sourceName, const char* kernelName, bool grid2D) {
-    passes_.push_back(std::make_unique<TovFilterPass>(*context(), sourceName, kernelName, dstBufferSize_, grid2D));
+    passes_.push_back(std::make_unique<TovFilterPass>(*context(), sourceName, kernelName, grid2D));
     return *passes_.back();
 }
 

@@ -88,8 +88,8 @@ void TovImageFilter::reserveState() {
 void TovImageFilter::apply() {
     TovContext& owner = require<TovContext>(context_);
     const FilterTree tree(*this);
-    checkSizes(*this);
     for (const FilterNode& node : tree.nodes()) {
+        checkSizes(*node.filter);
         require<TovContext>(node.filter->context_);
         checkValues(*node.filter);
     }
@@ -105,8 +105,9 @@ void TovImageFilter::apply() {
     privateCopies_.provide(tree);
 
     const TovImage& output = *dstBuffer_.boundImage();
-    const Size limits = {output.width(), output.height()};
-    for (const auto& pass : passes_) pass->Execute(tree.isFused() ? this : nullptr, limits);
+    const Size asked = dstBufferSize_.asSize();
+    const Size size = {std::min(asked[0], output.width()), std::min(asked[1], output.height())};
+    for (const auto& pass : passes_) pass->Execute(tree.isFused() ? this : nullptr, size);
     textures.release();
     for (const FilterNode& node : tree.nodes())
         for (const auto& pass : node.filter->passes_) pass->filterHasRun();

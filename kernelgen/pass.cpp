@@ -37,13 +37,11 @@ int32_t requireLaunchable(uint64_t items) {
 
 }  // namespace
 
-TovFilterPass::TovFilterPass(TovContext& context, const char* sourceName, const char* kernelName,
-                             const TovFilterParameter& sizeParameter, bool grid2D)
+TovFilterPass::TovFilterPass(TovContext& context, const char* sourceName, const char* kernelName, bool grid2D)
     : kernelName_(kernelName),
       sourceName_(sourceName),
       context_(context),
       code_((requireSource(sourceName), embeddedKernelCode(sourceName, kernelName))),
-      sizeParameter_(sizeParameter),
       grid2D_(grid2D) {}
 
 void TovFilterPass::addArgument(TovFilterParameter& parameter, bool readBack) {
@@ -114,18 +112,16 @@ zor::Kernel* TovFilterPass::findFusedKernel(TovImageFilter& root) const {
                                          .writeAfterRun = true});
 }
 
-void TovFilterPass::Execute(TovImageFilter* fusedRoot, const Size& limits) {
+void TovFilterPass::Execute(TovImageFilter* fusedRoot, const Size& size) {
     zor::setCacheDirectory(context_.cachePath());
     zor::Kernel* kernel = fusedRoot != nullptr ? findFusedKernel(*fusedRoot) : findKernel();
     if (kernel == nullptr) throw TovException{TOV_ERROR_INTERNAL_ERROR};
     zor::Launcher launcher(*context_.device(), *kernel);
     SetArguments(launcher, false);
-    launch(launcher, limits);
+    launch(launcher, size);
 }
 
-void TovFilterPass::launch(zor::Launcher& launcher, const Size& limits) const {
-    const Size asked = sizeParameter_.asSize();
-    const Size size = {std::min(asked[0], limits[0]), std::min(asked[1], limits[1])};
+void TovFilterPass::launch(zor::Launcher& launcher, const Size& size) const {
     const auto localX = static_cast<int32_t>(localSize_[0]);
     const auto localY = static_cast<int32_t>(localSize_[1]);
     if (grid2D_) {

@@ -13,9 +13,8 @@
 
 class TovFilterPass {
  public:
-    // Launches one work item per pixel of sizeParameter. Throws the internal error for an unknown source name.
-    TovFilterPass(TovContext& context, const char* sourceName, const char* kernelName,
-                  const TovFilterParameter& sizeParameter, bool grid2D);
+    // Throws the internal error for an unknown source name.
+    TovFilterPass(TovContext& context, const char* sourceName, const char* kernelName, bool grid2D);
 
     // ---- Filling by the catalogue ----
 
@@ -41,9 +40,9 @@ class TovFilterPass {
     std::string GetBuildOptions() const;
     // Binds the arguments in kernel order. An inner pass of a fused kernel leaves its outputs out.
     void SetArguments(zor::Launcher& launcher, bool skipOutputs) const;
-    // Builds or finds the kernel, binds and launches it over the size parameter, cut to limits (pixels), and waits.
-    // With a filter given, the kernel is the fused one of the tree under that filter, whose first pass this is.
-    void Execute(TovImageFilter* fusedRoot, const Size& limits);
+    // Builds or finds the kernel, binds it, launches one work item per pixel of the size, and waits. With a filter
+    // given, the kernel is the fused one of the tree under that filter, whose first pass this is.
+    void Execute(TovImageFilter* fusedRoot, const Size& size);
     void filterHasRun();
 
     const TovKernelCode& code() const noexcept { return code_; }
@@ -55,7 +54,7 @@ class TovFilterPass {
  private:
     zor::Kernel* findKernel() const;
     zor::Kernel* findFusedKernel(TovImageFilter& root) const;
-    void launch(zor::Launcher& launcher, const Size& limits) const;
+    void launch(zor::Launcher& launcher, const Size& size) const;
 
     std::string kernelName_;
     std::string sourceName_;
@@ -65,6 +64,5 @@ class TovFilterPass {
     const TovKernelCode& code_;
     Size localSize_ = {8, 8};
     std::string ownDefines_;
-    const TovFilterParameter& sizeParameter_;
     bool grid2D_;
 };

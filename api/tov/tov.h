@@ -196,7 +196,8 @@ TOV_API int32_t tovContextCreateImageFilter(tov_context context, uint32_t filter
 /**
  * Set a parameter by its exact, case-sensitive name. Values are used when the filter runs and are checked then.
  * tovImageFilterSetParameter2u also takes "srcRec" and "dstRec": width and height, in pixels, of the part of the
- * input and output that the filter works on, until the next binding.
+ * input and output that the filter works on, until the next binding. Filters of several passes work on whole outputs
+ * only: a smaller "dstRec" is refused when they run.
  *
  * @return TOV_ERROR_INVALID_FILTER; TOV_ERROR_INVALID_PARAMETER_NAME: name is null; TOV_ERROR_INVALID_PARAMETER:
  *         matrix, or values or images with a non-zero count, is null, an image array has more than 64 elements, one

@@ -106,6 +106,17 @@ TEST_F(ExecutionChecks, ZeroSizesAreRefusedAlsoThroughTheRectangles) {
         ASSERT_EQ(tovImageFilterSetParameter2u(filter, "dstRec", width, height), TOV_SUCCESS);
         EXPECT_EQ(executeQueue(), TOV_ERROR_INVALID_PARAMETER);
     }
+    // The width of 0 is hidden from the sizes of the filter that reads it, and its pitch gives it storage.
+    const Handle empty = newImage(tov_image_desc{0, 4, 1, 8, 0, 4, TOV_COMPONENT_TYPE_FLOAT32});
+    const Handle inner = newFilter(TOV_IMAGE_FILTER_RESAMPLE, {{"srcBuffer", tov_image{empty}}});
+    ASSERT_EQ(tovImageFilterSetParameter2u(inner, "srcRec", 1000000000, 4), TOV_SUCCESS);
+    ASSERT_EQ(tovImageFilterSetParameterImage(filter, "srcBuffer", inner), TOV_SUCCESS);
+    EXPECT_EQ(executeQueue(), TOV_ERROR_INVALID_PARAMETER);
+    ASSERT_EQ(tovCommandQueueDetachImageFilter(queue_, filter), TOV_SUCCESS);
+    const Handle blur = newFilter(TOV_IMAGE_FILTER_GAUSSIAN_BLUR, {{"sigma", 1.0f}});
+    ASSERT_EQ(tovCommandQueueAttachImageFilter(queue_, blur, input_, output_), TOV_SUCCESS);
+    ASSERT_EQ(tovImageFilterSetParameter2u(blur, "dstRec", 7, 4), TOV_SUCCESS);
+    EXPECT_EQ(executeQueue(), TOV_ERROR_INVALID_PARAMETER) << "its second pass reads what the first left out";
     const Handle small = newImage(Picture(19, 1, {1, TOV_COMPONENT_TYPE_UINT8}));
     EXPECT_EQ(execute(newFilter(TOV_IMAGE_FILTER_MATH_TEST), small, small), TOV_ERROR_INVALID_PARAMETER) << "20 bytes";
 }
