@@ -53,8 +53,9 @@ static inline float4 SumColumn(__global const float4* srcBuffer, int2 size, int 
 #define BLOCK_COLUMNS 8
 #define BLOCK_ROWS 4
 
-// Blocks side by side in a strip of the vertical pass: as many as keep the rows of a strip within 128 KiB of cache.
-#define STRIP_BLOCKS (TAPS < 512 ? 1024 / (TAPS + 3) : 2)
+// Blocks side by side in a strip of the vertical pass: as many as keep the rows of a strip within 128 KiB of cache, for
+// radii that leave room for two.
+#define STRIP_BLOCKS (TAPS < 510 ? 1024 / (TAPS + 3) : 2)
 
 // Pixels are staged for as many taps at a time, so that private memory has a bound for any radius.
 #define STAGED_TAPS (TAPS < 512 ? TAPS : 512)
@@ -64,24 +65,24 @@ static inline float4 SumColumn(__global const float4* srcBuffer, int2 size, int 
 typedef float16 __attribute__((aligned(16))) FourPixels;
 
 // Adds to the sums of 16 neighbouring pixels; `window` begins at the first pixel's first tap.
-#define DEFINE_ADD_TAPS(name, space)                                                                     \
-    static inline void name(float16* sums, space const float4* window, int first_tap, int taps) {       \
-        float16 sum0 = sums[0];                                                                          \
-        float16 sum1 = sums[1];                                                                          \
-        float16 sum2 = sums[2];                                                                          \
-        float16 sum3 = sums[3];                                                                          \
-        for (int i = 0; i < taps; ++i) {                                                                 \
-            const float weight = kCoefficients[first_tap + i];                                           \
-            space const FourPixels* pixels = (space const FourPixels*)(window + i);                      \
-            sum0 += pixels[0] * weight;                                                                  \
-            sum1 += pixels[1] * weight;                                                                  \
-            sum2 += pixels[2] * weight;                                                                  \
-            sum3 += pixels[3] * weight;                                                                  \
-        }                                                                                                \
-        sums[0] = sum0;                                                                                  \
-        sums[1] = sum1;                                                                                  \
-        sums[2] = sum2;                                                                                  \
-        sums[3] = sum3;                                                                                  \
+#define DEFINE_ADD_TAPS(name, space)                                                              \
+    static inline void name(float16* sums, space const float4* window, int first_tap, int taps) { \
+        float16 sum0 = sums[0];                                                                   \
+        float16 sum1 = sums[1];                                                                   \
+        float16 sum2 = sums[2];                                                                   \
+        float16 sum3 = sums[3];                                                                   \
+        for (int i = 0; i < taps; ++i) {                                                          \
+            const float weight = kCoefficients[first_tap + i];                                    \
+            space const FourPixels* pixels = (space const FourPixels*)(window + i);               \
+            sum0 += pixels[0] * weight;                                                           \
+            sum1 += pixels[1] * weight;                                                           \
+            sum2 += pixels[2] * weight;                                                           \
+            sum3 += pixels[3] * weight;                                                           \
+        }                                                                                         \
+        sums[0] = sum0;                                                                           \
+        sums[1] = sum1;                                                                           \
+        sums[2] = sum2;                                                                           \
+        sums[3] = sum3;                                                                           \
     }
 DEFINE_ADD_TAPS(AddTaps, __private)
 
@@ -91,6 +92,41 @@ DEFINE_ADD_TAPS(AddTaps, __private)
 #if READS_IN_PLACE
 DEFINE_ADD_TAPS(AddStoredTaps, __global)
 #endif
+
+// The sums of up to 32 pixels of a row, in parts of 16.
+static inline void SumRun(float16* sums, srcBufferType(srcBuffer), int width, int column, int row, int parts) {
+    float4 window[BLOCK_SIZE + STAGED_TAPS];
+    for (int i = 0; i < BLOCK_SIZE / 4; ++i) {
+        sums[i] = (float16)(0.0f);
+    }
+    for (int tap = 0; tap < TAPS; tap += STAGED_TAPS) {
+        const int taps = min(STAGED_TAPS, TAPS - tap);
+        const int first = column - cRadius + tap;
+        const int staged = parts * PIXELS_AT_A_TIME + taps - 1;
+        const bool is_inside = first >= 0 && first + staged <= width;
+#if READS_IN_PLACE
+        if (is_inside) {
+            __global const float4* pixels = srcBuffer + PixelIndex(GET_BUFFER_SIZE(srcBuffer), first, row);
+            for (int part = 0; part < parts; ++part) {
+                AddStoredTaps(sums + 4 * part, pixels + PIXELS_AT_A_TIME * part, tap, taps);
+            }
+            continue;
+        }
+#endif
+        if (is_inside) {
+            for (int i = 0; i < staged; ++i) {
+                window[i] = ReadPixel(srcBuffer, first + i, row);
+            }
+        } else {
+            for (int i = 0; i < staged; ++i) {
+                window[i] = ReadPixel(srcBuffer, MirrorCoordinate(first + i, width), row);
+            }
+        }
+        for (int part = 0; part < parts; ++part) {
+            AddTaps(sums + 4 * part, window + PIXELS_AT_A_TIME * part, tap, taps);
+        }
+    }
+}
 
 __kernel void GaussBlurHorKernel(srcBufferType(srcBuffer), dst_float_4 dstBuffer) {
     const int2 size = GET_BUFFER_SIZE(dstBuffer);
@@ -105,39 +141,8 @@ __kernel void GaussBlurHorKernel(srcBufferType(srcBuffer), dst_float_4 dstBuffer
         const int row = (int)(place / (uint)size.x);
         const int column = (int)(place % (uint)size.x);
         const int run = min((int)(behind - place), size.x - column);
-        const int parts = (run + PIXELS_AT_A_TIME - 1) / PIXELS_AT_A_TIME;
-        float4 window[BLOCK_SIZE + STAGED_TAPS];
         float16 sums[BLOCK_SIZE / 4];
-        for (int i = 0; i < BLOCK_SIZE / 4; ++i) {
-            sums[i] = (float16)(0.0f);
-        }
-        for (int tap = 0; tap < TAPS; tap += STAGED_TAPS) {
-            const int taps = min(STAGED_TAPS, TAPS - tap);
-            const int first = column - cRadius + tap;
-            const int staged = parts * PIXELS_AT_A_TIME + taps - 1;
-            const bool is_inside = first >= 0 && first + staged <= size.x;
-#if READS_IN_PLACE
-            if (is_inside) {
-                __global const float4* pixels = srcBuffer + PixelIndex(GET_BUFFER_SIZE(srcBuffer), first, row);
-                for (int part = 0; part < parts; ++part) {
-                    AddStoredTaps(sums + 4 * part, pixels + PIXELS_AT_A_TIME * part, tap, taps);
-                }
-                continue;
-            }
-#endif
-            if (is_inside) {
-                for (int i = 0; i < staged; ++i) {
-                    window[i] = ReadPixel(srcBuffer, first + i, row);
-                }
-            } else {
-                for (int i = 0; i < staged; ++i) {
-                    window[i] = ReadPixel(srcBuffer, MirrorCoordinate(first + i, size.x), row);
-                }
-            }
-            for (int part = 0; part < parts; ++part) {
-                AddTaps(sums + 4 * part, window + PIXELS_AT_A_TIME * part, tap, taps);
-            }
-        }
+        SumRun(sums, srcBuffer, size.x, column, row, (run + PIXELS_AT_A_TIME - 1) / PIXELS_AT_A_TIME);
         const float4* values = (const float4*)sums;
         for (int i = 0; i < run; ++i) {
             WritePixel_float_4(dstBuffer, size, column + i, row, values[i]);
@@ -155,8 +160,8 @@ static inline void SumRows(float16* sums, __global const float4* srcBuffer, int2
     __global const float4* top = srcBuffer + column;
 #define READ_ROW(tap) \
     *(__global const FourPixels*)(top + PixelIndex(size, 0, MirrorCoordinate(row - cRadius + (tap), size.y)))
-#define ADD_ROW(n)                              \
-    if (tap - n >= 0 && tap - n < TAPS) {       \
+#define ADD_ROW(n)                                 \
+    if (tap - n >= 0 && tap - n < TAPS) {          \
         sum##n += pixels * kCoefficients[tap - n]; \
     }
     for (int tap = 0; tap < BLOCK_ROWS - 1; ++tap) {
@@ -236,6 +241,19 @@ __kernel void GaussBlurVertKernel(src_float_4 srcBuffer, dstBufferType(dstBuffer
 // ---- One pixel per item --------------------------------------------------------------------------------------------
 
 #if USE_TILE
+// Fills the group's tile; `place` is where a pixel lies in the order of the pass. A device that cannot run groups of 32
+// blurs without the tile: that choice is the same for all items, but the barrier stands outside of it, since PoCL 3.1
+// runs a barrier under a condition wrong.
+#define STAGE_TILE(pixel)                                                            \
+    __local float4 tile[TILEWIDTH];                                                  \
+    const bool is_tiled = get_local_size(0) == BLOCK_SIZE;                           \
+    const int count = size.x * size.y;                                               \
+    for (int i = (int)get_local_id(0); is_tiled && i < TILEWIDTH; i += BLOCK_SIZE) { \
+        const int place = TilePlace(i, count);                                       \
+        tile[i] = pixel;                                                             \
+    }                                                                                \
+    barrier(CLK_LOCAL_MEM_FENCE);
+
 // The place, in the order of the pass, of entry i of the group's tile. Launches stay below 2^31 items, their halo may
 // not.
 static inline int TilePlace(int i, int count) {
@@ -262,16 +280,7 @@ static inline float4 SumOfTile(__local const float4* tile, int position, int siz
 __kernel void GaussBlurHorKernel(srcBufferType(srcBuffer), dst_float_4 dstBuffer) {
     const int2 size = GET_BUFFER_SIZE(dstBuffer);
 #if USE_TILE
-    __local float4 tile[TILEWIDTH];
-    // A device that cannot run groups of 32 blurs without the tile. That choice is the same for all items, but the
-    // barrier stands outside of it: PoCL 3.1 runs a barrier under a condition wrong.
-    const bool is_tiled = get_local_size(0) == BLOCK_SIZE;
-    const int count = size.x * size.y;
-    for (int i = (int)get_local_id(0); is_tiled && i < TILEWIDTH; i += BLOCK_SIZE) {
-        const int place = TilePlace(i, count);
-        tile[i] = ReadPixel(srcBuffer, place % size.x, place / size.x);
-    }
-    barrier(CLK_LOCAL_MEM_FENCE);
+    STAGE_TILE(ReadPixel(srcBuffer, place % size.x, place / size.x))
     if (is_tiled) {
         const int id = (int)get_global_id(0);
         if (id < count) {
@@ -294,14 +303,7 @@ __kernel void GaussBlurHorKernel(srcBufferType(srcBuffer), dst_float_4 dstBuffer
 __kernel void GaussBlurVertKernel(src_float_4 srcBuffer, dstBufferType(dstBuffer)) {
     const int2 size = GET_BUFFER_SIZE(dstBuffer);
 #if USE_TILE
-    __local float4 tile[TILEWIDTH];
-    const bool is_tiled = get_local_size(0) == BLOCK_SIZE;
-    const int count = size.x * size.y;
-    for (int i = (int)get_local_id(0); is_tiled && i < TILEWIDTH; i += BLOCK_SIZE) {
-        const int place = TilePlace(i, count);
-        tile[i] = ReadPixel_float_4(srcBuffer, size, place / size.y, place % size.y);
-    }
-    barrier(CLK_LOCAL_MEM_FENCE);
+    STAGE_TILE(ReadPixel_float_4(srcBuffer, size, place / size.y, place % size.y))
     if (is_tiled) {
         const int id = (int)get_global_id(0);
         if (id < count) {

@@ -18,8 +18,8 @@ static inline void ComputeEntries(const Space* space, const Sample* centre, cons
     entries[1] = (float8)(0.0f);
     for (int b = 0; b < space->blocks; ++b) {
         const float8* p = space->projection[b];
-        entries[b] += d.s0 * p[0] + d.s1 * p[1] + d.s2 * p[2] + d.s3 * p[3] + d.s4 * p[4] + d.s5 * p[5] +
-                      d.s6 * p[6] + d.s7 * p[7] + last * p[8];
+        entries[b] += d.s0 * p[0] + d.s1 * p[1] + d.s2 * p[2] + d.s3 * p[3] + d.s4 * p[4] + d.s5 * p[5] + d.s6 * p[6] +
+                      d.s7 * p[7] + last * p[8];
     }
 }
 
@@ -97,7 +97,9 @@ static inline void SumQuadratic(IMAGE_PARAMETERS, const Window* window, const Sa
         for (int b = 0; b < blocks; ++b) {
             entries[b] = own[b];
             own[b] *= own[b];
-            own[0].s0 = 0.0f;
+        }
+        own[0].s0 = 0.0f;
+        for (int b = 0; b < blocks; ++b) {
             entries[blocks + b] = own[b];
         }
         const float weight = KernelWeight(space, own, 1.0f, FullWeight(space, &sample));

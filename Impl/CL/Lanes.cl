@@ -76,7 +76,7 @@ INLINED Ints Magnitude(Floats value) {
 
 // Where a magnitude is usable as IsUsable has it.
 INLINED Ints Usable(Ints magnitude) {
-    return (magnitude - 0x58635fa9) >> 31;
+    return (magnitude - BITS_OF_1E15) >> 31;
 }
 
 INLINED Floats ZeroUnless(Ints mask, Floats value) {

@@ -2,5 +2,5 @@
 // of J. Jimenez et al., "Practical Morphological Anti-Aliasing" (2011): find the edges between pixels, follow each edge
 // to its ends, look up how much of the pixels beside it the true outline covers, and blend them by those areas.
 //
-// The shared text follows; the three passes come after it, each built only with a definition of its own.
+// The shared texts follow; the three passes come after them, each built only with a definition of its own.
 

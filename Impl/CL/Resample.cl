@@ -19,10 +19,10 @@ __kernel void ResampleKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer),
 
 #if INTERPOLATION_OPERATOR == 0
     // Sizes that a host overrides may be of any magnitude, and so their ratios.
-    const int2 first = (int2)((int)min((long)coord.x * CRATIO_X, (long)extent.x),
-                              (int)min((long)coord.y * CRATIO_Y, (long)extent.y));
-    const int2 behind = (int2)((int)min((long)first.x + CRATIO_X, (long)extent.x),
-                               (int)min((long)first.y + CRATIO_Y, (long)extent.y));
+    const int2 first =
+        (int2)((int)min((long)coord.x * CRATIO_X, (long)extent.x), (int)min((long)coord.y * CRATIO_Y, (long)extent.y));
+    const int2 behind =
+        (int2)((int)min((long)first.x + CRATIO_X, (long)extent.x), (int)min((long)first.y + CRATIO_Y, (long)extent.y));
     float4 sum = (float4)(0.0f);
     for (int row = first.y; row < behind.y; ++row) {
         for (int column = first.x; column < behind.x; ++column) {
@@ -35,8 +35,8 @@ __kernel void ResampleKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer),
 #else
     const int2 last = max(extent - 1, (int2)(0));
     // The ratio of a side of one output pixel divides by zero: that pixel takes the first of the source.
-    const float2 position = (float2)(cDstRes.x > 1 ? cRatio.x * (float)coord.x : 0.0f,
-                                     cDstRes.y > 1 ? cRatio.y * (float)coord.y : 0.0f);
+    const float2 position =
+        (float2)(cDstRes.x > 1 ? cRatio.x * (float)coord.x : 0.0f, cDstRes.y > 1 ? cRatio.y * (float)coord.y : 0.0f);
     const float2 whole = trunc(position);
     const float2 t = position - whole;
     const int2 q = clamp(convert_int2_sat(whole), (int2)(0), last);
@@ -64,14 +64,67 @@ __kernel void ResampleKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer),
 #else
 
 #define BLOCK_SIDE 8
+#define LEAVE_UNLESS_CORNER(corner, limits)                                                                         \
+    if (corner.x % BLOCK_SIDE != 0 || corner.y % BLOCK_SIDE != 0 || corner.x >= limits.x || corner.y >= limits.y) { \
+        return;                                                                                                     \
+    }
 
 #if INTERPOLATION_OPERATOR == 0
-#define HAS_SMALL_SQUARES (CRATIO_X > 0 && CRATIO_X <= 64 && CRATIO_Y > 0 && CRATIO_Y <= 64)
-
 // Where the source pixels of an output column or row begin; sizes that a host overrides may be of any magnitude.
-static inline int BlockStart(int position, long ratio, int extent) {
+static inline int SquareStart(int position, long ratio, int extent) {
     return (int)min((long)position * ratio, (long)extent);
 }
+
+INLINED float4 AverageOf(srcBufferType(srcBuffer), int left, int right, int top, int below) {
+    const float count = (float)(right - left) * (float)(below - top);
+    float4 sum = (float4)(0.0f);
+    for (int row = top; row < below; ++row) {
+        for (int column = left; column < right; ++column) {
+            sum += ReadPixel(srcBuffer, column, row);
+        }
+    }
+    return count > 0.0f ? sum / count : (float4)(0.0f, 0.0f, 0.0f, 1.0f);
+}
+
+#if CRATIO_X > 0 && CRATIO_X <= 64 && CRATIO_Y > 0 && CRATIO_Y <= 64
+#define HAS_SMALL_SQUARES 1
+#else
+#define HAS_SMALL_SQUARES 0
+#endif
+
+// An item takes as many pixels as a block has, but in the order of the rows: they share nothing, and the source is read
+// as it lies.
+__kernel void ResampleKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), int2 cSrcRes, int2 cDstRes,
+                             float2 cRatio) {
+    const int2 limits = min(cDstRes, GET_BUFFER_SIZE(dstBuffer));
+    const int2 corner = (int2)((int)get_global_id(0), (int)get_global_id(1));
+    LEAVE_UNLESS_CORNER(corner, limits)
+    const int2 extent = max(min(cSrcRes, GET_BUFFER_SIZE(srcBuffer)), (int2)(0));
+    const int across = (limits.x - 1) / BLOCK_SIDE + 1;
+    const long block = (long)(corner.y / BLOCK_SIDE) * across + corner.x / BLOCK_SIDE;
+    long place = block * BLOCK_SIDE * BLOCK_SIDE;
+    const long behind = min(place + BLOCK_SIDE * BLOCK_SIDE, (long)limits.x * limits.y);
+    while (place < behind) {
+        const int y = (int)(place / limits.x);
+        const int first = (int)(place % limits.x);
+        const int after = (int)min(first + (behind - place), (long)limits.x);
+        const int top = SquareStart(y, CRATIO_Y, extent.y);
+        const int below = SquareStart(y + 1, CRATIO_Y, extent.y);
+        const bool is_whole = HAS_SMALL_SQUARES && (long)after * CRATIO_X <= extent.x && below - top == CRATIO_Y;
+        for (int x = first; x < after && is_whole; ++x) {
+            // Of known size: the compiler unrolls it.
+            const int left = x * CRATIO_X;
+            WritePixel(dstBuffer, x, y, AverageOf(srcBuffer, left, left + CRATIO_X, top, top + CRATIO_Y));
+        }
+        for (int x = first; x < after && !is_whole; ++x) {
+            const int left = SquareStart(x, CRATIO_X, extent.x);
+            const int right = SquareStart(x + 1, CRATIO_X, extent.x);
+            WritePixel(dstBuffer, x, y, AverageOf(srcBuffer, left, right, top, below));
+        }
+        place += after - first;
+    }
+}
+
 #else
 
 #define TAPS (2 * INTERPOLATION_OPERATOR)
@@ -106,63 +159,23 @@ static inline void FindSamples(Samples* samples, int position, int size, float r
     samples->weight[3] = (0.5f * t - 0.5f) * t * t;
 #endif
 }
-#endif
+// One source row at the columns of a block.
+INLINED void InterpolateRow(srcBufferType(srcBuffer), const Samples* across, int row, float4* line) {
+    for (int i = 0; i < BLOCK_SIDE; ++i) {
+        float4 sum = ReadPixel(srcBuffer, across[i].place[0], row) * across[i].weight[0];
+        for (int k = 1; k < TAPS; ++k) {
+            sum += ReadPixel(srcBuffer, across[i].place[k], row) * across[i].weight[k];
+        }
+        line[i] = sum;
+    }
+}
 
 __kernel void ResampleKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), int2 cSrcRes, int2 cDstRes,
                              float2 cRatio) {
     const int2 limits = min(cDstRes, GET_BUFFER_SIZE(dstBuffer));
     const int2 corner = (int2)((int)get_global_id(0), (int)get_global_id(1));
-    if (corner.x % BLOCK_SIDE != 0 || corner.y % BLOCK_SIDE != 0 || corner.x >= limits.x || corner.y >= limits.y) {
-        return;
-    }
+    LEAVE_UNLESS_CORNER(corner, limits)
     const int2 extent = max(min(cSrcRes, GET_BUFFER_SIZE(srcBuffer)), (int2)(0));
-    const int columns = min(BLOCK_SIDE, limits.x - corner.x);
-    const int rows = min(BLOCK_SIDE, limits.y - corner.y);
-
-#if INTERPOLATION_OPERATOR == 0
-    // As many pixels as a block has, in the order of the rows: they share nothing, and the source is read as it lies.
-    const int across = (limits.x - 1) / BLOCK_SIDE + 1;
-    const long block = (long)(corner.y / BLOCK_SIDE) * across + corner.x / BLOCK_SIDE;
-    long place = block * BLOCK_SIDE * BLOCK_SIDE;
-    const long behind = min(place + BLOCK_SIDE * BLOCK_SIDE, (long)limits.x * limits.y);
-    while (place < behind) {
-        const int y = (int)(place / limits.x);
-        const int x = (int)(place % limits.x);
-        const int run = (int)min(behind - place, (long)(limits.x - x));
-        const int top = BlockStart(y, CRATIO_Y, extent.y);
-        const int below = BlockStart(y + 1, CRATIO_Y, extent.y);
-#if HAS_SMALL_SQUARES
-        if ((long)(x + run) * CRATIO_X <= extent.x && below - top == CRATIO_Y) {
-            // Whole squares: loops of known length.
-            for (int i = x; i < x + run; ++i) {
-                float4 sum = (float4)(0.0f);
-                for (int row = 0; row < CRATIO_Y; ++row) {
-                    for (int column = 0; column < CRATIO_X; ++column) {
-                        sum += ReadPixel(srcBuffer, i * CRATIO_X + column, top + row);
-                    }
-                }
-                WritePixel(dstBuffer, i, y, sum * (1.0f / (CRATIO_X * CRATIO_Y)));
-            }
-            place += run;
-            continue;
-        }
-#endif
-        for (int i = x; i < x + run; ++i) {
-            const int left = BlockStart(i, CRATIO_X, extent.x);
-            const int right = BlockStart(i + 1, CRATIO_X, extent.x);
-            const float count = (float)(right - left) * (float)(below - top);
-            float4 sum = (float4)(0.0f);
-            for (int row = top; row < below; ++row) {
-                for (int column = left; column < right; ++column) {
-                    sum += ReadPixel(srcBuffer, column, row);
-                }
-            }
-            const float4 result = count > 0.0f ? sum / count : (float4)(0.0f, 0.0f, 0.0f, 1.0f);
-            WritePixel(dstBuffer, i, y, result);
-        }
-        place += run;
-    }
-#else
     // All eight columns are computed: loops of known length. Those behind the picture repeat its last one.
     Samples across[BLOCK_SIDE];
     for (int i = 0; i < BLOCK_SIDE; ++i) {
@@ -175,38 +188,31 @@ __kernel void ResampleKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer),
     for (int i = 0; i < TAPS; ++i) {
         line_rows[i] = -1;
     }
-    for (int y = corner.y; y < corner.y + rows; ++y) {
+    for (int y = corner.y; y < min(corner.y + BLOCK_SIDE, limits.y); ++y) {
         Samples down;
         FindSamples(&down, y, cDstRes.y, cRatio.y, extent.y);
-        for (int j = 0; j < TAPS; ++j) {
-            const int row = down.place[j];
-            float4* line = (float4*)lines[row % TAPS];
-            if (line_rows[row % TAPS] == row) {
-                continue;
-            }
-            line_rows[row % TAPS] = row;
-            for (int i = 0; i < BLOCK_SIDE; ++i) {
-                float4 sum = ReadPixel(srcBuffer, across[i].place[0], row) * across[i].weight[0];
-                for (int k = 1; k < TAPS; ++k) {
-                    sum += ReadPixel(srcBuffer, across[i].place[k], row) * across[i].weight[k];
-                }
-                line[i] = sum;
-            }
-        }
         float16 sums[BLOCK_SIDE / 4];
         for (int i = 0; i < BLOCK_SIDE / 4; ++i) {
-            sums[i] = lines[down.place[0] % TAPS][i] * down.weight[0];
-            for (int j = 1; j < TAPS; ++j) {
-                sums[i] += lines[down.place[j] % TAPS][i] * down.weight[j];
+            sums[i] = (float16)(0.0f);
+        }
+        for (int j = 0; j < TAPS; ++j) {
+            const int row = down.place[j];
+            float16* line = lines[row % TAPS];
+            if (line_rows[row % TAPS] != row) {
+                line_rows[row % TAPS] = row;
+                InterpolateRow(srcBuffer, across, row, (float4*)line);
+            }
+            for (int i = 0; i < BLOCK_SIDE / 4; ++i) {
+                sums[i] += line[i] * down.weight[j];
             }
         }
         const float4* pixels = (const float4*)sums;
-        for (int i = 0; i < columns; ++i) {
+        for (int i = 0; i < min(BLOCK_SIDE, limits.x - corner.x); ++i) {
             WritePixel(dstBuffer, corner.x + i, y, pixels[i]);
         }
     }
-#endif
 }
 
+#endif
 #endif
 #endif

@@ -271,7 +271,6 @@ static inline void WritePixel_sampler_(__write_only image2d_t buffer, int2 buffe
 #endif
 
 // ---- Vectors and guards --------------------------------------------------------------------------------------------
-
 static inline float dot3F4(float4 a, float4 b) {
     return a.x * b.x + a.y * b.y + a.z * b.z;
 }
@@ -280,11 +279,12 @@ static inline float Luminance(float4 rgba) {
     return dot3F4(rgba, WHITEPOINT);
 }
 
-// Whether all components are below 1e15 in magnitude, so that sums of their squares stay finite, and none is NaN.
-// It looks at the bits: programs are built with relaxed math, where a compiler may take NaN and infinity for absent.
+// Whether all magnitudes are below 1e15, so that sums of their squares stay finite, and none is NaN. It looks at the
+// bits: programs are built with relaxed math, where a compiler may take NaN and infinity for absent.
+#define BITS_OF_1E15 0x58635fa9
 static inline bool IsUsable(float4 value) {
     const uint4 magnitude = as_uint4(value) & (uint4)(0x7fffffffu);
-    return all(magnitude < (uint4)(0x58635fa9u)) != 0;
+    return all(magnitude < (uint4)(BITS_OF_1E15)) != 0;
 }
 
 // ---- Powers --------------------------------------------------------------------------------------------------------
