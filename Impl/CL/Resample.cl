@@ -86,12 +86,6 @@ INLINED float4 AverageOf(srcBufferType(srcBuffer), int left, int right, int top,
     return count > 0.0f ? sum / count : (float4)(0.0f, 0.0f, 0.0f, 1.0f);
 }
 
-#if CRATIO_X > 0 && CRATIO_X <= 64 && CRATIO_Y > 0 && CRATIO_Y <= 64
-#define HAS_SMALL_SQUARES 1
-#else
-#define HAS_SMALL_SQUARES 0
-#endif
-
 // An item takes as many pixels as a block has, but in the order of the rows: they share nothing, and the source is read
 // as it lies.
 __kernel void ResampleKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), int2 cSrcRes, int2 cDstRes,
@@ -110,16 +104,21 @@ __kernel void ResampleKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer),
         const int after = (int)min(first + (behind - place), (long)limits.x);
         const int top = SquareStart(y, CRATIO_Y, extent.y);
         const int below = SquareStart(y + 1, CRATIO_Y, extent.y);
-        const bool is_whole = HAS_SMALL_SQUARES && (long)after * CRATIO_X <= extent.x && below - top == CRATIO_Y;
-        for (int x = first; x < after && is_whole; ++x) {
-            // Of known size: the compiler unrolls it.
-            const int left = x * CRATIO_X;
-            WritePixel(dstBuffer, x, y, AverageOf(srcBuffer, left, left + CRATIO_X, top, top + CRATIO_Y));
-        }
-        for (int x = first; x < after && !is_whole; ++x) {
-            const int left = SquareStart(x, CRATIO_X, extent.x);
-            const int right = SquareStart(x + 1, CRATIO_X, extent.x);
-            WritePixel(dstBuffer, x, y, AverageOf(srcBuffer, left, right, top, below));
+#if CRATIO_X > 0 && CRATIO_X <= 64 && CRATIO_Y > 0 && CRATIO_Y <= 64
+        const bool is_whole = (long)after * CRATIO_X <= extent.x && below - top == CRATIO_Y;
+#else
+        const bool is_whole = false;
+#endif
+        for (int x = first; x < after; ++x) {
+            if (is_whole) {
+                // Of known size: the compiler unrolls it.
+                const int left = x * CRATIO_X;
+                WritePixel(dstBuffer, x, y, AverageOf(srcBuffer, left, left + CRATIO_X, top, top + CRATIO_Y));
+            } else {
+                const int left = SquareStart(x, CRATIO_X, extent.x);
+                const int right = SquareStart(x + 1, CRATIO_X, extent.x);
+                WritePixel(dstBuffer, x, y, AverageOf(srcBuffer, left, right, top, below));
+            }
         }
         place += after - first;
     }
