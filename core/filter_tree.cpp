@@ -22,10 +22,6 @@ bool isScaling(const TovImageFilter& filter) {
     return filter.spec().sizeRule == SizeRule::AnyInput;
 }
 
-bool isInput(const TovFilterParameter& parameter) {
-    return std::string_view(parameter.name()) == "srcBuffer";
-}
-
 void requireFusable(const TovImageFilter& filter) {
     if (!filter.spec().fusable)
         refuseFusion(filter.kernelName() + " has several passes, memory of its own or a window that every pixel walks");
@@ -85,12 +81,12 @@ void FilterTree::visit(TovImageFilter& filter, const Size& outputSize, bool read
 void FilterTree::visitInputs(TovImageFilter& filter, const Size& outputSize, bool readsAround) {
     for (TovFilterParameter* parameter : filter.imageParameters()) {
         const bool inner = nodes_.front().filter != &filter;
-        if (inner && std::string_view(parameter->name()) == "dstBuffer") continue;  // an old binding, of no account
+        if (inner && filter.isMainOutput(*parameter)) continue;  // an old binding, of no account
         for (uint32_t i = 0; i < parameter->imageCount(); ++i) {
             TovImageFilter* input = parameter->boundFilter(i);
             if (input == nullptr) continue;
             requireFusable(filter);
-            const bool scaled = isScaling(filter) && isInput(*parameter);
+            const bool scaled = isScaling(filter) && filter.isInput(*parameter);
             const Size size = scaled ? naturalSize(*input) : outputSize;
             if (scaled) filter.find("srcBufferSize")->setRunSize(size);
             visit(*input, size, readsAround);

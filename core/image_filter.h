@@ -62,6 +62,8 @@ class TovImageFilter final : public TovObject {
 
     // Built-in or listed parameter; null for an unknown name. For the catalogue and the checks.
     TovFilterParameter* find(std::string_view name) noexcept;
+    bool isInput(const TovFilterParameter& parameter) const noexcept { return &parameter == &srcBuffer_; }
+    bool isMainOutput(const TovFilterParameter& parameter) const noexcept { return &parameter == &dstBuffer_; }
     // Every parameter that can bind images, input first, output second.
     const std::vector<TovFilterParameter*>& imageParameters() const noexcept { return imageParameters_; }
     const FilterSpec& spec() const noexcept { return spec_; }

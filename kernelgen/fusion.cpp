@@ -24,9 +24,6 @@ constexpr std::string_view kRepeatType = "REPEAT";
 bool contains(const std::string& text, std::string_view part) {
     return text.find(part) != kNone;
 }
-bool isOutput(const TovKernelVariable& argument) {
-    return contains(argument.type, "dstBufferType");
-}
 bool isArray(const TovKernelVariable& argument) {
     return contains(argument.type, kArrayType);
 }
@@ -204,7 +201,7 @@ class TreeFusion {
             for (uint32_t element = 0; element < count; ++element) {
                 const size_t position = code.arguments.size();
                 code.arguments.push_back(isElement ? elementOf(parsed[i], element) : parsed[i]);
-                if (isOutput(parsed[i]) || parameter == nullptr || !parameter->isImageLike()) continue;
+                if (parsed[i].isOutput() || parameter == nullptr || !parameter->isImageLike()) continue;
                 if (TovImageFilter* input = parameter->boundFilter(element))
                     merges.push_back(
                         {position, fuse(*input, levels_.take(level + kLevelStep + static_cast<int>(element)))});
@@ -254,7 +251,7 @@ void RenameKernel(TovKernelCode& code, const std::string& suffix) {
 std::string InlineFunctionText(const TovKernelCode& code) {
     std::string text = code.helpers + "\ninline float4 " + code.name + "(\n";
     for (const TovKernelVariable& argument : code.arguments)
-        if (!isOutput(argument)) text += "   " + argument.text() + ",\n";
+        if (!argument.isOutput()) text += "   " + argument.text() + ",\n";
     text += "   int xidx, \n   int yidx)\n{\n" + code.body + "}\n";
     returnInsteadOfWriting(text);
     takeCoordinates(text);
@@ -267,7 +264,7 @@ void MergeImageArgument(TovKernelCode& outer, size_t position, const TovKernelCo
     const std::string image = outer.arguments[position].name;
     std::vector<TovKernelVariable> inputs;
     std::copy_if(inner.arguments.begin(), inner.arguments.end(), std::back_inserter(inputs),
-                 [](const TovKernelVariable& argument) { return !isOutput(argument); });
+                 [](const TovKernelVariable& argument) { return !argument.isOutput(); });
     std::string call = inner.name + "(";
     for (const TovKernelVariable& argument : inputs) call += argument.name + ", ";
     call += "x, y)";

@@ -86,8 +86,7 @@ std::string_view bodyOf(std::string_view text) noexcept {
 }  // namespace
 
 std::string TovKernelVariable::text() const {
-    const bool macro =
-        type.find("dstBufferType") != std::string::npos || type.find("srcBufferType") != std::string::npos;
+    const bool macro = isOutput() || type.find("srcBufferType") != std::string::npos;
     return macro ? type + "(" + name + ")" : type + " " + name;
 }
 

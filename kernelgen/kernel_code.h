@@ -12,6 +12,8 @@ struct TovKernelVariable {
 
     // "type(name)" for the macro form of image parameters, "type name" otherwise.
     std::string text() const;
+    // An image that the kernel writes.
+    bool isOutput() const noexcept { return type.find("dstBufferType") != std::string::npos; }
 };
 
 struct TovKernelCode {

@@ -71,8 +71,7 @@ std::string TovFilterPass::GetBuildOptions() const {
 
 void TovFilterPass::SetArguments(zor::Launcher& launcher, bool skipOutputs) const {
     for (size_t i = 0; i < arguments_.size(); ++i) {
-        const bool isOutput =
-            i < code_.arguments.size() && code_.arguments[i].type.find("dstBufferType") != std::string::npos;
+        const bool isOutput = i < code_.arguments.size() && code_.arguments[i].isOutput();
         if (!(skipOutputs && isOutput)) arguments_[i]->SetKernelArgument(launcher);
     }
 }
