@@ -38,7 +38,6 @@ class TovContext final : public TovObject {
     // time, when the device refuses.
     void reserveScratch(uint64_t size);
     const zor::Buffer<char>* scratchBuffer() const noexcept { return scratch_.buffer.get(); }
-    uint64_t scratchCapacity() const noexcept { return scratch_.capacity; }
     const ScratchHolder& scratch() const noexcept { return scratch_; }
 
  private:

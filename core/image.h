@@ -58,7 +58,6 @@ class TovImage final : public TovObject {
     const DevicePointer& device() const noexcept { return device_; }
     const zor::Buffer<char>* storage() const noexcept { return storage_.get(); }
     bool hasStorage() const noexcept { return storage_ != nullptr && storage_->hasMemory(); }
-    bool isExternal() const noexcept { return external_; }
     uint32_t externalKind() const noexcept { return externalKind_; }
     bool isOpenClImage() const noexcept { return externalKind_ != EXTERNAL_KIND_BUFFER; }
 
@@ -85,7 +84,6 @@ class TovImage final : public TovObject {
     DevicePointer device_;
     tov_image_desc desc_;
     uint64_t byteSize_;
-    bool external_ = false;
     uint32_t externalKind_ = EXTERNAL_KIND_BUFFER;
     Placement placement_;
     std::unique_ptr<zor::Buffer<char>> storage_;

@@ -68,7 +68,6 @@ void TovImage::placeBuffer(cl_mem memory, uint64_t size) {
 
 void TovImage::wrapOpenClMemory(cl_mem memory, bool isImage) {
     storage_.reset();
-    external_ = true;
     const uint64_t size = requireSize(memory);
     auto* const context = device_->getContext();
     if (memoryInfo<cl_context>(memory, CL_MEM_CONTEXT).value_or(context) != context)
@@ -97,6 +96,5 @@ void TovImage::wrapOpenGlTexture(uint32_t target, int32_t level, uint32_t textur
     storage_ = std::make_unique<zor::Buffer<char>>(*device_, size, zor::BUFFER_NO_ALLOCATION);
     placement_ = {memory.get(), 0, size, {texture, target, static_cast<uint32_t>(level)}};
     storage_->adopt(memory.release(), size, true);
-    external_ = true;
     externalKind_ = EXTERNAL_KIND_TEXTURE;
 }

@@ -10,9 +10,9 @@ uint64_t nextSerial = 1;
 std::vector<TovObject*>* live = nullptr;
 
 // The list alone is freed when the library is unloaded. Objects still in it are left to the host's exit: destroying
-// them then could call into a driver that is already gone. A host that calls from its own exit handlers finds nothing
-// instead of freed memory; the pointer lies outside, for a compiler may drop what a destructor stores in its own
-// object.
+// them then could call into a driver that is already gone. A host that calls from its own exit handlers finds no object
+// from before, instead of freed memory, and its new ones get a new list. The pointer lies outside, for a compiler may
+// drop what a destructor stores in its own object.
 struct ListOwner {
     ~ListOwner() {
         delete live;
@@ -20,6 +20,10 @@ struct ListOwner {
     }
 };
 const ListOwner listOwner{};
+
+size_t size() noexcept {
+    return live == nullptr ? 0 : live->size();
+}
 
 }  // namespace
 
@@ -46,10 +50,6 @@ TovObject* lookUp(const void* handle) noexcept {
 void remove(std::ptrdiff_t index) noexcept {
     const std::unique_ptr<TovObject> object((*live)[static_cast<size_t>(index)]);
     live->erase(live->begin() + index);
-}
-
-size_t size() noexcept {
-    return live == nullptr ? 0 : live->size();
 }
 
 }  // namespace registry

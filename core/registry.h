@@ -21,8 +21,6 @@ TovObject* lookUp(const void* handle) noexcept;
 // Erases the entry and destroys its object; later entries move down by one.
 void remove(std::ptrdiff_t index) noexcept;
 
-size_t size() noexcept;
-
 }  // namespace registry
 
 // A remembered handle that knows when its object has been deleted, also when the address is in use again.

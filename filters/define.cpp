@@ -6,14 +6,9 @@
 
 #include "core/exception.h"
 #include "core/image.h"
-#include "core/image_filter.h"
 #include "kernelgen/option_text.h"
 
 namespace {
-
-void requireType(const TovFilterParameter& parameter, uint32_t type) {
-    if (parameter.type() != type) throw TovException{TOV_ERROR_INVALID_PARAMETER};
-}
 
 std::string imageDefines(const std::string& name, const TovFilterParameter& parameter, uint32_t element) {
     if (const auto& size = parameter.runSize()) return computedImageDefines(name, (*size)[0], (*size)[1]);
@@ -55,8 +50,8 @@ GaussianCoeffsGenerator::GaussianCoeffsGenerator(const TovFilterParameter& sigma
     : TovDefine("", sigma), radius_(&radius) {}
 
 std::string GaussianCoeffsGenerator::GetText() const {
-    requireType(*radius_, TOV_PARAMETER_TYPE_UINT1);
-    requireType(*parameter_, TOV_PARAMETER_TYPE_FLOAT1);
+    radius_->requireType(TOV_PARAMETER_TYPE_UINT1, TOV_ERROR_INVALID_PARAMETER);
+    parameter_->requireType(TOV_PARAMETER_TYPE_FLOAT1, TOV_ERROR_INVALID_PARAMETER);
     const auto radius = static_cast<int64_t>(radius_->asUint());
     const float denominator = 2.0f * parameter_->asFloat() * parameter_->asFloat();
     std::vector<float> weights;
@@ -79,8 +74,8 @@ RatioToDefConverter::RatioToDefConverter(const TovFilterParameter& sourceSize,
     : TovDefine("", sourceSize), destinationSize_(&destinationSize) {}
 
 std::string RatioToDefConverter::GetText() const {
-    requireType(*parameter_, TOV_PARAMETER_TYPE_UINT2);
-    requireType(*destinationSize_, TOV_PARAMETER_TYPE_UINT2);
+    parameter_->requireType(TOV_PARAMETER_TYPE_UINT2, TOV_ERROR_INVALID_PARAMETER);
+    destinationSize_->requireType(TOV_PARAMETER_TYPE_UINT2, TOV_ERROR_INVALID_PARAMETER);
     const Size source = parameter_->asSize();
     const Size destination = destinationSize_->asSize();
     return ::define("CRATIO_X", decimal(quotient(source[0], destination[0]))) +

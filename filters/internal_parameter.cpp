@@ -12,10 +12,6 @@ namespace {
 
 constexpr int32_t kAbsentImage = 0;
 
-void requireType(const TovFilterParameter& parameter, uint32_t type) {
-    if (parameter.type() != type) throw TovException{TOV_ERROR_INVALID_PARAMETER};
-}
-
 void setBuffer(zor::Launcher& launcher, const zor::BufferBase* buffer) {
     // An empty buffer must never stand in for memory that a kernel writes.
     if (buffer == nullptr || !buffer->hasMemory()) throw TovException{TOV_ERROR_INTERNAL_ERROR};
@@ -70,7 +66,7 @@ ColorSpaceConvertor::ColorSpaceConvertor(TovFilterParameter& colorSpace, Directi
     : TovInternalParameter(colorSpace), direction_(direction) {}
 
 void ColorSpaceConvertor::SetKernelArgument(zor::Launcher& launcher) {
-    requireType(*parameter_, TOV_PARAMETER_TYPE_UINT1);
+    parameter_->requireType(TOV_PARAMETER_TYPE_UINT1, TOV_ERROR_INVALID_PARAMETER);
     const uint32_t index = parameter_->asUint() - 1;
     const auto gamuts = ColorTools::gamuts();
     if (index >= gamuts.size())
@@ -86,8 +82,8 @@ RatioConverter::RatioConverter(TovFilterParameter& sourceSize, TovFilterParamete
     : TovInternalParameter(sourceSize), destinationSize_(&destinationSize) {}
 
 void RatioConverter::SetKernelArgument(zor::Launcher& launcher) {
-    requireType(*parameter_, TOV_PARAMETER_TYPE_UINT2);
-    requireType(*destinationSize_, TOV_PARAMETER_TYPE_UINT2);
+    parameter_->requireType(TOV_PARAMETER_TYPE_UINT2, TOV_ERROR_INVALID_PARAMETER);
+    destinationSize_->requireType(TOV_PARAMETER_TYPE_UINT2, TOV_ERROR_INVALID_PARAMETER);
     const Size source = parameter_->asSize();
     const Size destination = destinationSize_->asSize();
     std::array<float, 2> ratio{};
@@ -97,7 +93,7 @@ void RatioConverter::SetKernelArgument(zor::Launcher& launcher) {
 }
 
 void ViewProjectionSwapper::SetKernelArgument(zor::Launcher& launcher) {
-    requireType(*parameter_, TOV_PARAMETER_TYPE_FLOAT16);
+    parameter_->requireType(TOV_PARAMETER_TYPE_FLOAT16, TOV_ERROR_INVALID_PARAMETER);
     launcher.arg(initialised_ ? previous_ : parameter_->asMatrix());
     launcher.arg(parameter_->asMatrix());
 }

@@ -4,20 +4,9 @@
 
 #include "core/exception.h"
 #include "core/image.h"
-#include "core/image_filter.h"
+#include "core/image_filter.h"  // upward: an image parameter may bind a filter
 
 namespace {
-
-struct TypeSize {
-    uint32_t type;
-    uint32_t bytes;
-};
-constexpr TypeSize kTypeSizes[] = {
-    {TOV_PARAMETER_TYPE_FLOAT1, 4},   {TOV_PARAMETER_TYPE_FLOAT2, 8},      {TOV_PARAMETER_TYPE_FLOAT3, 12},
-    {TOV_PARAMETER_TYPE_FLOAT4, 16},  {TOV_PARAMETER_TYPE_IMAGE, 8},       {TOV_PARAMETER_TYPE_UINT1, 4},
-    {TOV_PARAMETER_TYPE_UINT2, 8},    {TOV_PARAMETER_TYPE_FLOAT_ARRAY, 8}, {TOV_PARAMETER_TYPE_IMAGE_ARRAY, 8},
-    {TOV_PARAMETER_TYPE_FLOAT16, 64},
-};
 
 [[noreturn]] void throwDeleted(const ObjectRef& reference) {
     throw TovException{reference.type() == TovImageFilter::kType ? TovImageFilter::kInvalidHandle
@@ -31,14 +20,8 @@ TovFilterParameter::TovFilterParameter(uint32_t type, const char* name, const ch
     if (type == TOV_PARAMETER_TYPE_FLOAT_ARRAY || type == TOV_PARAMETER_TYPE_IMAGE_ARRAY) count_ = 0;
 }
 
-uint32_t TovFilterParameter::valueSize() const noexcept {
-    for (const TypeSize& row : kTypeSizes)
-        if (row.type == type_) return row.bytes;
-    return 0;
-}
-
-void TovFilterParameter::requireType(uint32_t type) const {
-    if (type != type_) throw TovException{TOV_ERROR_UNSUPPORTED};
+void TovFilterParameter::requireType(uint32_t type, int32_t code) const {
+    if (type != type_) throw TovException{code};
 }
 
 void TovFilterParameter::set1u(uint32_t value) {
@@ -54,11 +37,6 @@ void TovFilterParameter::set2u(const Size& value) {
 void TovFilterParameter::set1f(float value) {
     requireType(TOV_PARAMETER_TYPE_FLOAT1);
     value_.floats[0] = value;
-}
-
-void TovFilterParameter::set2f(const std::array<float, 2>& value) {
-    requireType(TOV_PARAMETER_TYPE_FLOAT2);
-    std::copy(value.begin(), value.end(), value_.floats.begin());
 }
 
 void TovFilterParameter::set3f(const std::array<float, 3>& value) {

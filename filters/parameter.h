@@ -33,15 +33,16 @@ class TovFilterParameter {
     uint32_t type() const noexcept { return type_; }
     const char* name() const noexcept { return name_; }
     const char* description() const noexcept { return description_; }
-    uint32_t valueSize() const noexcept;                    // bytes
     uint32_t count() const noexcept { return count_; }      // elements of an array, 1 otherwise
     const void* value() const noexcept { return &value_; }  // what the host reads through
+
+    // Throws the code when the parameter has another type.
+    void requireType(uint32_t type, int32_t code = TOV_ERROR_UNSUPPORTED) const;
 
     // Each throws unsupported, changing nothing, when the parameter has another type.
     void set1u(uint32_t value);
     void set2u(const Size& value);
     void set1f(float value);
-    void set2f(const std::array<float, 2>& value);
     void set3f(const std::array<float, 3>& value);
     void set4f(const std::array<float, 4>& value);
     void set16f(const Matrix& value);
@@ -82,8 +83,6 @@ class TovFilterParameter {
     void clearRunSize() noexcept { runSize_.reset(); }
 
  private:
-    void requireType(uint32_t type) const;
-
     uint32_t type_;
     uint32_t count_ = 1;
     const char* name_;

@@ -5,7 +5,7 @@
 #include <string>
 
 #include "core/exception.h"
-#include "core/image_filter.h"
+#include "core/image_filter.h"  // upward: the values are a filter's
 #include "kernelgen/option_text.h"
 #include "zor/device_cl.h"
 

@@ -95,8 +95,6 @@ class Device {
     uint32_t binaryVersion() const noexcept { return binaryVersion_; }
     // Made for an OpenGL context.
     bool isGlShared() const noexcept { return glShared_; }
-    // Adopted the caller's OpenCL objects, which are then never released.
-    bool isExternal() const noexcept { return external_; }
 
     // Accounting of allocated device memory, in bytes; for zor::Buffer.
     void countAllocation(uint64_t bytes) noexcept;
@@ -111,9 +109,7 @@ class Device {
     uint64_t totalMemory_ = 0;
     uint64_t peakUsedMemory_ = 0;
     bool glShared_ = false;
-    uint32_t profilingFlags_ = 0;
     uint32_t binaryVersion_ = 0;
-    bool external_ = false;
 };
 
 // False for every kind but DEVICE_KIND_CL; for that one takes a reference on the OpenCL library and tells whether it

@@ -125,7 +125,6 @@ void DeviceCL::release() {
     queue_ = nullptr;
     id_ = nullptr;
     glShared_ = false;
-    external_ = false;
 }
 
 void DeviceCL::adopt(cl_context context, cl_device_id device, cl_command_queue queue) {
@@ -133,7 +132,6 @@ void DeviceCL::adopt(cl_context context, cl_device_id device, cl_command_queue q
     ownContext_.reset();
     ownQueue_.reset();
     glShared_ = false;
-    external_ = true;
     context_ = context;
     queue_ = queue;
     id_ = device;

@@ -35,8 +35,8 @@ class DeviceCL final : public Device {
     void setQueuePriority(bool high) override;
 
     // Releases the device's own context, then its own queue (whatever of them exists), puts the caller's objects in
-    // their place without retaining them, reads the limits again from the caller's device, makes the kernel map if
-    // there is none and marks the device external.
+    // their place without retaining them, reads the limits again from the caller's device, and makes the kernel
+    // map if there is none.
     void adopt(cl_context context, cl_device_id device, cl_command_queue queue);
 
     cl_device_id id() const noexcept;

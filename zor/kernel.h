@@ -24,7 +24,6 @@ class Kernel {
     Kernel(KernelHandle kernel, std::string name, uint64_t sourceIdentity = 0)
         : kernel_(std::move(kernel)), name_(std::move(name)), sourceIdentity_(sourceIdentity) {}
 
-    uint32_t kind() const noexcept { return DEVICE_KIND_CL; }
     cl_kernel handle() const noexcept { return kernel_.get(); }
     const std::string& name() const noexcept { return name_; }
     uint64_t sourceIdentity() const noexcept { return sourceIdentity_; }
@@ -67,8 +66,6 @@ class Launcher {
     }
     // The next argument: a buffer's memory object.
     void arg(const BufferBase& buffer);
-
-    uint32_t argumentCount() const noexcept { return next_; }
 
     // Local sizes are clamped to 1 ... the device's limits, the global size rounded up to whole groups (at least one).
     // Returns when the kernel has run.

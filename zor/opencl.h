@@ -32,7 +32,6 @@ class EntryPoint<Result CL_API_CALL(Arguments...)> {
     }
     explicit operator bool() const noexcept { return function_ != nullptr; }
 
-    const char* name() const noexcept { return name_; }
     void set(void* address) noexcept { function_ = reinterpret_cast<Function>(address); }
 
  private:
