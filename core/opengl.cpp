@@ -1,19 +1,19 @@
 #include "core/opengl.h"
 
 #include "core/exception.h"
-
-#if defined(_WIN32)
-#include <windows.h>
-#else
-#include <dlfcn.h>
-#endif
+#include "zor/dynamic_library.h"
 
 namespace {
 
 #if defined(_WIN32)
 #define TOV_GL_CALL __stdcall
+constexpr const char* kLibraryName = "opengl32.dll";
+#elif defined(__APPLE__)
+#define TOV_GL_CALL
+constexpr const char* kLibraryName = "/System/Library/Frameworks/OpenGL.framework/OpenGL";
 #else
 #define TOV_GL_CALL
+constexpr const char* kLibraryName = "libGL.so.1";
 #endif
 
 constexpr uint32_t kTextureWidth = 0x1000;
@@ -34,18 +34,9 @@ struct OpenGl {
 
 // The host has OpenGL loaded, so the process itself is asked first, then the system's library.
 void* findSymbol(const char* name) {
-#if defined(_WIN32)
-    static const HMODULE library = LoadLibraryExA("opengl32.dll", nullptr, LOAD_LIBRARY_SEARCH_SYSTEM32);
-    return library == nullptr ? nullptr : reinterpret_cast<void*>(GetProcAddress(library, name));
-#else
-    if (void* symbol = dlsym(RTLD_DEFAULT, name)) return symbol;
-#if defined(__APPLE__)
-    static void* const library = dlopen("/System/Library/Frameworks/OpenGL.framework/OpenGL", RTLD_NOW | RTLD_LOCAL);
-#else
-    static void* const library = dlopen("libGL.so.1", RTLD_NOW | RTLD_LOCAL);
-#endif
-    return library == nullptr ? nullptr : dlsym(library, name);
-#endif
+    if (void* symbol = zor::findLoadedSymbol(name)) return symbol;
+    static void* const library = zor::openLibrary(kLibraryName);
+    return library == nullptr ? nullptr : zor::findSymbol(library, name);
 }
 
 template <class Function>

@@ -5,16 +5,11 @@
 #include <cstdlib>
 #include <optional>
 
-#ifdef _WIN32
-#include <windows.h>
-#else
-#include <dlfcn.h>
-#endif
+#include "zor/dynamic_library.h"
 
 namespace zor {
 namespace {
 
-// Names only: the system's loader searches its own directories, never the working directory.
 #if defined(_WIN32)
 constexpr std::array kLibraryNames = {"OpenCL.dll"};
 #elif defined(__APPLE__)
@@ -30,28 +25,6 @@ struct Library {
     std::optional<clGetGLContextInfoKHR_fn> glContextInfo;
 };
 constinit Library library;
-
-#ifdef _WIN32
-void* openLibrary(const char* name) noexcept {
-    return LoadLibraryExA(name, nullptr, LOAD_LIBRARY_SEARCH_SYSTEM32);
-}
-void closeLibrary(void* handle) noexcept {
-    FreeLibrary(static_cast<HMODULE>(handle));
-}
-void* findSymbol(void* handle, const char* name) noexcept {
-    return reinterpret_cast<void*>(GetProcAddress(static_cast<HMODULE>(handle), name));
-}
-#else
-void* openLibrary(const char* name) noexcept {
-    return dlopen(name, RTLD_NOW | RTLD_LOCAL);
-}
-void closeLibrary(void* handle) noexcept {
-    dlclose(handle);
-}
-void* findSymbol(void* handle, const char* name) noexcept {
-    return dlsym(handle, name);
-}
-#endif
 
 void* openFirstLibrary() noexcept {
     for (const char* name : kLibraryNames)
