@@ -3,7 +3,7 @@
 #include <array>
 #include <charconv>
 
-#include "zor/kernel_builder.h"
+#include "zor/cache_name.h"
 
 namespace {
 

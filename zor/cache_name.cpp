@@ -4,6 +4,7 @@
 #include <array>
 #include <filesystem>
 
+#include "zor/device_cl.h"
 #include "zor/number_text.h"
 
 namespace zor {

@@ -8,6 +8,7 @@
 #include <string>
 
 #include "zor/cache_name.h"
+#include "zor/opencl.h"
 
 namespace zor {
 

@@ -4,8 +4,6 @@
 #include <cstdint>
 #include <string>
 
-#include "zor/kernel_builder.h"
-
 namespace zor {
 
 // Nanoseconds since the system's epoch.
@@ -20,5 +18,9 @@ FileTime libraryTime();
 
 // The binary was written after the library file.
 bool isNewerThanLibrary(const std::string& binary);
+
+// The binary exists and is newer than the source, or there is no source. Prints a line for a file that cannot be
+// opened.
+bool isFileUpToDate(const std::string& binary, const std::string& source);
 
 }  // namespace zor
