@@ -58,7 +58,9 @@ int32_t tovImageFilterSetParameterImage(tov_image_filter filter, const char* nam
     return setParameter(filter, name, [&](TovImageFilter& target) {
         TovObject* object = registry::lookUp(image);
         if (auto* input = as<TovImageFilter>(object)) return target.setFilterAsImage(name, *input);
-        target.setImage(name, require<TovImage>(image));
+        TovImage* source = as<TovImage>(object);
+        require(source != nullptr, TovImage::kInvalidHandle);
+        target.setImage(name, *source);
     });
 }
 

@@ -9,7 +9,6 @@
 
 namespace {
 
-// An object's size when it is an image.
 Size sizeOf(const TovImage& image) {
     return {image.width(), image.height()};
 }

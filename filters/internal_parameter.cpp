@@ -6,7 +6,7 @@
 #include "core/image.h"
 #include "core/image_filter.h"  // upward: a filter may feed a filter, whose first pass then appends its own arguments
 #include "filters/color_tools.h"
-#include "kernelgen/pass.h"
+#include "kernelgen/pass.h"  // upward, likewise
 
 namespace {
 
@@ -62,7 +62,7 @@ void TovInternalParameter::SetKernelArgument(zor::Launcher& launcher) {
     }
 }
 
-ColorSpaceConvertor::ColorSpaceConvertor(TovFilterParameter& colorSpace, Direction direction) noexcept
+ColorSpaceConvertor::ColorSpaceConvertor(const TovFilterParameter& colorSpace, Direction direction) noexcept
     : TovInternalParameter(colorSpace), direction_(direction) {}
 
 void ColorSpaceConvertor::SetKernelArgument(zor::Launcher& launcher) {
@@ -78,7 +78,7 @@ void ColorSpaceConvertor::SetKernelArgument(zor::Launcher& launcher) {
     launcher.arg(std::array<float, 12>{m[0], m[1], m[2], 0, m[3], m[4], m[5], 0, m[6], m[7], m[8], 0});
 }
 
-RatioConverter::RatioConverter(TovFilterParameter& sourceSize, TovFilterParameter& destinationSize) noexcept
+RatioConverter::RatioConverter(const TovFilterParameter& sourceSize, const TovFilterParameter& destinationSize) noexcept
     : TovInternalParameter(sourceSize), destinationSize_(&destinationSize) {}
 
 void RatioConverter::SetKernelArgument(zor::Launcher& launcher) {

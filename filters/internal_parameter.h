@@ -14,7 +14,7 @@ using StateSlot = std::unique_ptr<zor::Buffer<char>>;
 class TovInternalParameter {
  public:
     // With readBack, an output argument whose content a later pass of the filter reads.
-    explicit TovInternalParameter(TovFilterParameter& parameter, bool readBack = false) noexcept
+    explicit TovInternalParameter(const TovFilterParameter& parameter, bool readBack = false) noexcept
         : parameter_(&parameter), readBack_(readBack) {}
     explicit TovInternalParameter(const ScratchHolder& scratch) noexcept : scratch_(&scratch) {}
     // The slot, not the buffer: a replaced buffer is seen.
@@ -32,7 +32,7 @@ class TovInternalParameter {
     const TovFilterParameter* parameter() const noexcept { return parameter_; }
 
  protected:
-    TovFilterParameter* parameter_ = nullptr;
+    const TovFilterParameter* parameter_ = nullptr;
 
  private:
     bool readBack_ = false;
@@ -44,7 +44,7 @@ class TovInternalParameter {
 class ColorSpaceConvertor final : public TovInternalParameter {
  public:
     enum Direction : uint32_t { FROM_XYZ = 0, TO_XYZ = 1 };
-    ColorSpaceConvertor(TovFilterParameter& colorSpace, Direction direction) noexcept;
+    ColorSpaceConvertor(const TovFilterParameter& colorSpace, Direction direction) noexcept;
     void SetKernelArgument(zor::Launcher& launcher) override;
 
  private:
@@ -55,18 +55,18 @@ class ColorSpaceConvertor final : public TovInternalParameter {
 // destination of one pixel has ratio 0.
 class RatioConverter final : public TovInternalParameter {
  public:
-    RatioConverter(TovFilterParameter& sourceSize, TovFilterParameter& destinationSize) noexcept;
+    RatioConverter(const TovFilterParameter& sourceSize, const TovFilterParameter& destinationSize) noexcept;
     void SetKernelArgument(zor::Launcher& launcher) override;
 
  private:
-    TovFilterParameter* destinationSize_;
+    const TovFilterParameter* destinationSize_;
 };
 
 // The previous run's and the current view-projection matrix; the same twice in the first run. A run that failed does
 // not count.
 class ViewProjectionSwapper final : public TovInternalParameter {
  public:
-    explicit ViewProjectionSwapper(TovFilterParameter& matrix) noexcept : TovInternalParameter(matrix) {}
+    explicit ViewProjectionSwapper(const TovFilterParameter& matrix) noexcept : TovInternalParameter(matrix) {}
     void SetKernelArgument(zor::Launcher& launcher) override;
     void filterHasRun() override;
 

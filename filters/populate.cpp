@@ -4,8 +4,8 @@
 
 namespace {
 
-TovFilterParameter& require(TovImageFilter& filter, const char* name) {
-    TovFilterParameter* parameter = filter.find(name);
+const TovFilterParameter& require(TovImageFilter& filter, const char* name) {
+    const TovFilterParameter* parameter = filter.find(name);
     if (parameter == nullptr) refuse(TOV_ERROR_INTERNAL_ERROR, std::string("The catalogue names no parameter ") + name);
     return *parameter;
 }
@@ -20,49 +20,36 @@ void addColorSpace(TovImageFilter& filter, TovFilterPass& pass, const char* name
 }
 
 void addItem(TovImageFilter& filter, TovFilterPass& pass, const PassItem& item) {
-    const auto sourceSize = [&]() -> TovFilterParameter& { return require(filter, "srcBufferSize"); };
-    const auto destinationSize = [&]() -> TovFilterParameter& { return require(filter, "dstBufferSize"); };
+    const auto sourceSize = [&]() -> const TovFilterParameter& { return require(filter, "srcBufferSize"); };
+    const auto destinationSize = [&]() -> const TovFilterParameter& { return require(filter, "dstBufferSize"); };
     switch (item.kind) {
         case PassItemKind::Argument:
-            pass.addArgument(require(filter, item.name));
-            break;
+            return pass.addArgument(require(filter, item.name));
         case PassItemKind::ReadBack:
-            pass.addArgument(require(filter, item.name), true);
-            break;
+            return pass.addArgument(require(filter, item.name), true);
         case PassItemKind::OwnParameters:
-            addOwnParameters(filter, pass);
-            break;
+            return addOwnParameters(filter, pass);
         case PassItemKind::Scratch:
-            pass.addScratchArgument();
-            break;
+            return pass.addScratchArgument();
         case PassItemKind::State:
-            pass.addStateArgument(filter.stateBuffer());
-            break;
+            return pass.addStateArgument(filter.stateBuffer());
         case PassItemKind::Define:
-            pass.addParameterDefine(item.name, require(filter, item.parameter));
-            break;
+            return pass.addParameterDefine(item.name, require(filter, item.parameter));
         case PassItemKind::BuildOption:
-            pass.addBuildOption(item.name);
-            break;
+            return pass.addBuildOption(item.name);
         case PassItemKind::ToXyz:
-            addColorSpace(filter, pass, item.name, ColorSpaceConvertor::TO_XYZ);
-            break;
+            return addColorSpace(filter, pass, item.name, ColorSpaceConvertor::TO_XYZ);
         case PassItemKind::FromXyz:
-            addColorSpace(filter, pass, item.name, ColorSpaceConvertor::FROM_XYZ);
-            break;
+            return addColorSpace(filter, pass, item.name, ColorSpaceConvertor::FROM_XYZ);
         case PassItemKind::Ratio:
-            pass.addInternalParameter(std::make_unique<RatioConverter>(sourceSize(), destinationSize()));
-            break;
+            return pass.addInternalParameter(std::make_unique<RatioConverter>(sourceSize(), destinationSize()));
         case PassItemKind::RatioDefines:
-            pass.addDefine(std::make_unique<RatioToDefConverter>(sourceSize(), destinationSize()));
-            break;
+            return pass.addDefine(std::make_unique<RatioToDefConverter>(sourceSize(), destinationSize()));
         case PassItemKind::GaussianCoefficients:
-            pass.addDefine(
+            return pass.addDefine(
                 std::make_unique<GaussianCoeffsGenerator>(require(filter, "sigma"), require(filter, "radius")));
-            break;
         case PassItemKind::ViewProjectionPair:
-            pass.addInternalParameter(std::make_unique<ViewProjectionSwapper>(require(filter, item.name)));
-            break;
+            return pass.addInternalParameter(std::make_unique<ViewProjectionSwapper>(require(filter, item.name)));
     }
 }
 

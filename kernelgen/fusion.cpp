@@ -167,7 +167,6 @@ class TreeFusion {
     TovKernelCode fuse(TovImageFilter& filter, int level) {
         const TovFilterPass& pass = filter.firstPass();
         TovKernelCode code = pass.code();
-        if (code.arguments.empty()) refuseForm(code.name);
         ParseDefinitions(code, level == 0 ? pass.GetBuildOptions() : pass.GetDefines());
         nameRepeatedArguments(code, pass);
         if (level != 0) RenameKernel(code, std::to_string(level));

@@ -9,8 +9,8 @@
 #include "kernelgen/fusion.h"
 #include "kernelgen/option_text.h"
 #include "kernelgen/sources.h"
+#include "zor/cache_name.h"
 #include "zor/file_time.h"
-#include "zor/kernel_builder.h"
 
 namespace {
 
@@ -21,6 +21,14 @@ std::string_view requireSource(const std::string& name) {
     const std::string_view source = findKernelSource(name);
     if (source.empty()) refuse(TOV_ERROR_INTERNAL_ERROR, "There is no kernel source named " + name);
     return source;
+}
+
+const TovKernelCode& requireKernelCode(const std::string& sourceName, const std::string& kernelName) {
+    requireSource(sourceName);
+    const TovKernelCode& code = embeddedKernelCode(sourceName, kernelName);
+    if (code.arguments.empty())
+        refuse(TOV_ERROR_INTERNAL_ERROR, "The kernel source " + sourceName + " has no kernel named " + kernelName);
+    return code;
 }
 
 bool isQuarrion(const zor::Device& device) {
@@ -41,10 +49,10 @@ TovFilterPass::TovFilterPass(TovContext& context, const char* sourceName, const 
     : kernelName_(kernelName),
       sourceName_(sourceName),
       context_(context),
-      code_((requireSource(sourceName), embeddedKernelCode(sourceName, kernelName))),
+      code_(requireKernelCode(sourceName, kernelName)),
       grid2D_(grid2D) {}
 
-void TovFilterPass::addArgument(TovFilterParameter& parameter, bool readBack) {
+void TovFilterPass::addArgument(const TovFilterParameter& parameter, bool readBack) {
     const size_t position = arguments_.size();
     arguments_.push_back(std::make_unique<TovInternalParameter>(parameter, readBack));
     if (!parameter.isImageLike()) return;

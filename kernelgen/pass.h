@@ -13,14 +13,14 @@
 
 class TovFilterPass {
  public:
-    // Throws the internal error for an unknown source name.
+    // Throws the internal error for an unknown source or kernel.
     TovFilterPass(TovContext& context, const char* sourceName, const char* kernelName, bool grid2D);
 
     // ---- Filling by the catalogue ----
 
     // Appends the parameter as the next argument, and the layout definitions of its images under the name that the
     // kernel has at the same position. readBack: see TovInternalParameter.
-    void addArgument(TovFilterParameter& parameter, bool readBack = false);
+    void addArgument(const TovFilterParameter& parameter, bool readBack = false);
     void addScratchArgument() { arguments_.push_back(std::make_unique<TovInternalParameter>(context_.scratch())); }
     void addStateArgument(const StateSlot& state) {
         arguments_.push_back(std::make_unique<TovInternalParameter>(state));
