@@ -1,4 +1,6 @@
 // One run of a filter: checks, resources, passes.
+#include <algorithm>
+
 #include "core/exception.h"
 #include "core/filter_tree.h"
 #include "core/image_checks.h"

@@ -1,6 +1,5 @@
 #include "kernelgen/pass.h"
 
-#include <algorithm>
 #include <array>
 #include <limits>
 #include <span>
