@@ -6,6 +6,7 @@
 #include <CLI/Formatter.hpp>
 #include <algorithm>
 
+#include "denoise_defaults.h"
 #include "failure.h"
 #include "filter_names.h"
 #include "text.h"
@@ -56,15 +57,11 @@ constexpr const char* kRunFooter =
     "  tov run wide.exr -f color_space:srcColorSpace=rec2020,dstColorSpace=srgb -o narrow.exr --device cpu";
 
 constexpr const char* kDenoiseFooter =
-    "The settings are chosen from the picture's noise. Albedo, normals and depth (each without noise, if possible) "
-    "keep\n"
-    "edges and textures; without a variance one is estimated, guided by them. Of an OpenEXR file with layers those "
-    "are\n"
-    "used that carry the names which renderers give: Noisy Image, Combined, beauty or rgba; Denoising Albedo, Albedo "
-    "or\n"
-    "DiffCol; Denoising Normal, Normal or N; Depth or Z; Variance. Options take precedence. Depths of 1e9 and more, "
-    "and\n"
-    "infinite ones, are taken as sky. Values stay linear and alpha stays as it is.\n"
+    "The settings are chosen from the picture's noise. Albedo, normals and depth (each without noise, if possible)\n"
+    "keep edges and textures; without a variance one is estimated, guided by them. Of an OpenEXR file with layers\n"
+    "those are used that carry the names which renderers give: Noisy Image, Combined, beauty or rgba; Denoising\n"
+    "Albedo, Albedo or DiffCol; Denoising Normal, Normal or N; Depth or Z; Variance. Options take precedence. Depths\n"
+    "of 1e9 and more, and infinite ones, are taken as sky. Values stay linear and alpha stays as it is.\n"
     "\n"
     "Examples:\n"
     "  tov denoise layers.exr -o clean.exr\n"
@@ -138,7 +135,8 @@ void addDenoise(CLI::App& app, RawArguments& raw) {
     feature("--depth", raw.depth, "Distances from the camera, 0 where nothing is hit");
     feature("--variance", raw.variance, "Variance of the picture's pixels (default: estimated)");
     denoise->add_option("--method", raw.method, "eaw (fast, the default) or lwr (regression)")->type_name("METHOD");
-    denoise->add_option("--samples", raw.samples, "Samples per pixel of the render, for lwr")->type_name("N");
+    denoise->add_option("--samples", raw.samples, "Samples per pixel of the render, 2 ... 65536, for lwr")
+        ->type_name("N");
     addWork(*denoise, raw);
     denoise->footer(kDenoiseFooter);
 }
@@ -190,6 +188,13 @@ DenoiseMethod parseMethod(const std::string& text) {
     throw usageFailure("--method: \"" + text + "\" is not one of eaw, lwr");
 }
 
+uint32_t parseSamples(const std::string& text) {
+    const uint32_t samples = parseUint(text, "--samples");
+    if (samples < kFewestSamples) throw usageFailure("--samples: at least " + std::to_string(kFewestSamples));
+    if (samples > kMostSamples) throw usageFailure("--samples: at most " + std::to_string(kMostSamples));
+    return samples;
+}
+
 DenoiseCommand makeDenoise(const CLI::App& denoise, const RawArguments& raw) {
     DenoiseCommand command{makeWork(denoise, raw), {}};
     DenoiseOptions& options = command.options;
@@ -203,8 +208,7 @@ DenoiseCommand makeDenoise(const CLI::App& denoise, const RawArguments& raw) {
     give("--variance", raw.variance, options.variance);
     if (denoise.count("--method") > 0) options.method = parseMethod(raw.method);
     if (denoise.count("--samples") == 0) return command;
-    options.samples = parseUint(raw.samples, "--samples");
-    if (*options.samples < 2) throw usageFailure("--samples: at least 2");
+    options.samples = parseSamples(raw.samples);
     if (options.method != DenoiseMethod::kRegression) throw usageFailure("--samples goes with --method lwr");
     return command;
 }

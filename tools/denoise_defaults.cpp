@@ -6,10 +6,10 @@
 #include <cstddef>
 #include <stdexcept>
 
+#include "picture.h"
+
 namespace tool {
 namespace {
-
-constexpr size_t kComponents = 4;
 
 float luminance(const float* rgb) {
     return 0.2126f * rgb[0] + 0.7152f * rgb[1] + 0.0722f * rgb[2];

@@ -28,6 +28,10 @@ WaveletSettings waveletSettings(float noise, bool hasFeatures);
 // Parameters of the regression filter, by name. Its input images are sums over `samples` samples: multiply the colour
 // and the features of a render by `samples`, all variances of means by samples * (samples - 1), and divide the output
 // by `samples`. The result hardly depends on `samples`, so that a render whose count is not known needs no other value.
+// More than kMostSamples scale variances towards 1e15, from which on the filter takes them for unusable and gives the
+// pixels back as they are.
+inline constexpr uint32_t kFewestSamples = 2;
+inline constexpr uint32_t kMostSamples = 65536;
 struct RegressionSettings {
     uint32_t samples;
     uint32_t halfWindow;

@@ -5,10 +5,11 @@
 #include <cmath>
 #include <cstddef>
 
+#include "picture.h"
+
 namespace tool {
 
 Luminance measureLuminance(std::span<const float> rgba) {
-    constexpr size_t kComponents = 4;
     double sum = 0.0;
     double maximum = 0.0;
     size_t count = 0;

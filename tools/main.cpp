@@ -95,7 +95,7 @@ ExitStatus runTool(Streams& streams, int argc, const char* const* argv) {
     } catch (const std::exception& error) {
         message = error.what();
     }
-    if (status == ExitStatus::kFailed) streams.showLibraryLines();
+    if (status == ExitStatus::kFailed || status == ExitStatus::kNoDevice) streams.showLibraryLines();
     complain(message);
     return status;
 }

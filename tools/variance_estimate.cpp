@@ -7,10 +7,11 @@
 #include <cmath>
 #include <stdexcept>
 
+#include "picture.h"
+
 namespace tool {
 namespace {
 
-constexpr size_t kComponents = 4;
 constexpr int kRadius = 3;
 constexpr size_t kWindow = size_t{kRadius} * 2 + 1;  // pixels on a side
 constexpr int kSmoothingRadius = 1;

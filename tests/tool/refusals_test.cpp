@@ -22,7 +22,9 @@ TEST_F(Refusals, HaveAStatusAndAMessageAndLeaveTheOldFileAndNothingElse) {
         {"run -f sobel -o out.png cut.exr", 4, "cannot read cut.exr"},
         {"run -f sobel -o out.png /dev/zero", 4, "not a regular file"},
         {"run -f sobel -o out.png huge.ppm", 1, "160000000000 bytes; at most 4294967295"},
-        {"denoise a.exr -o out.png --albedo small.exr", 2, "small.exr has 4 x 3 pixels"}};
+        {"denoise a.exr -o out.png --albedo small.exr", 2, "small.exr has 4 x 3 pixels"},
+        {"denoise a.exr -o out.png --method lwr --samples 1", 2, "--samples: at least 2"},
+        {"denoise a.exr -o out.png --method lwr --samples 65537", 2, "--samples: at most 65536"}};
     for (const auto& [arguments, status, message] : rows)
         expect(status, message, arguments, "RUN='run a.exr -o out.png -f';");
     EXPECT_EQ(readFile("out.png"), "old\n");
