@@ -32,6 +32,10 @@ inline Failure usageFailure(const std::string& message) {
     return {ExitStatus::kUsage, message};
 }
 
+inline Failure unwritable(const std::string& path, const std::string& why) {
+    return {ExitStatus::kUnwritable, "cannot write " + path + ": " + why};
+}
+
 // "TOV_ERROR_... (-12): meaning" for a code of the library.
 std::string describeCode(int32_t code);
 

@@ -39,8 +39,6 @@ struct TypeRow {
     size_t floats;  // 0: not made of floats
 };
 
-constexpr size_t kMatrixFloats = 16;
-
 constexpr std::array kTypes = {
     TypeRow{TOV_PARAMETER_TYPE_FLOAT1, "float", 1},
     TypeRow{TOV_PARAMETER_TYPE_FLOAT2, "2 floats", 2},

@@ -2,6 +2,7 @@
 #ifndef TOV_TOOLS_FILTER_INFO_H
 #define TOV_TOOLS_FILTER_INFO_H
 
+#include <cstddef>
 #include <cstdint>
 #include <string>
 #include <string_view>
@@ -10,6 +11,8 @@
 #include "handle.h"
 
 namespace tool {
+
+inline constexpr size_t kMatrixFloats = 16;  // of TOV_PARAMETER_TYPE_FLOAT16, row after row
 
 struct ParameterInfo {
     std::string name;

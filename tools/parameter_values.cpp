@@ -2,7 +2,6 @@
 #include "parameter_values.h"
 
 #include <algorithm>
-#include <charconv>
 
 #include "failure.h"
 #include "filter_info.h"
@@ -13,7 +12,6 @@ namespace tool {
 
 namespace {
 
-constexpr size_t kMatrixFloats = 16;
 constexpr size_t kMaxInputs = 6;
 constexpr const char* kInputCount = "inputsNum";
 constexpr std::string_view kWrittenImage = "outVarianceImg";

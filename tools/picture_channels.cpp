@@ -7,6 +7,8 @@
 #include <iterator>
 #include <string_view>
 
+#include "text.h"
+
 namespace tool {
 
 namespace {
@@ -20,10 +22,6 @@ ChannelName splitName(const std::string& channel) {
     const size_t dot = channel.rfind('.');
     if (dot == std::string::npos) return {"", channel};
     return {channel.substr(0, dot), channel.substr(dot + 1)};
-}
-
-char lower(char c) {
-    return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
 }
 
 struct NameTest {
@@ -41,14 +39,16 @@ struct NameTest {
     }
 };
 
+constexpr NameTest kAnyCase = {true, false};
+constexpr NameTest kAnyCaseEnding = {true, true};
+
 // From the strictest to the most forgiving.
-constexpr std::array kNameTests = {NameTest{false, false}, NameTest{false, true}, NameTest{true, false},
-                                   NameTest{true, true}};
+constexpr std::array kNameTests = {NameTest{false, false}, NameTest{false, true}, kAnyCase, kAnyCaseEnding};
 
 // 0 for the layer without a name, then the beauty layers in their order, then all others alike.
 size_t rank(const std::string& layer) {
     if (layer.empty()) return 0;
-    const auto isLayer = [&](std::string_view name) { return NameTest{true, true}(layer, name); };
+    const auto isLayer = [&](std::string_view name) { return kAnyCaseEnding(layer, name); };
     return 1 + static_cast<size_t>(std::ranges::find_if(kBeautyLayers, isLayer) - kBeautyLayers.begin());
 }
 
@@ -81,7 +81,7 @@ class Layers {
     std::optional<ChannelChoice> findLone() const {
         std::optional<ChannelChoice> choice;
         for (size_t i = 0; i < channels_.size(); ++i) {
-            if (equal(channels_[i].name, "A") && channels_.size() > 1) continue;
+            if (kAnyCase(channels_[i].name, "A") && channels_.size() > 1) continue;
             if (choice) return std::nullopt;
             add(choice.emplace(), static_cast<int>(i));
         }
@@ -90,14 +90,9 @@ class Layers {
     }
 
  private:
-    static bool equal(std::string_view a, std::string_view upper) {
-        const auto same = [](char x, char y) { return (x >= 'a' && x <= 'z' ? x - 'a' + 'A' : x) == y; };
-        return std::ranges::equal(a, upper, same);
-    }
-
     int index(const std::string& layer, std::string_view name) const {
         for (size_t i = 0; i < channels_.size(); ++i) {
-            if (channels_[i].layer == layer && equal(channels_[i].name, name)) return static_cast<int>(i);
+            if (channels_[i].layer == layer && kAnyCase(channels_[i].name, name)) return static_cast<int>(i);
         }
         return -1;
     }

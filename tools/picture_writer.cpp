@@ -4,7 +4,6 @@
 #include <OpenImageIO/imageio.h>
 
 #include <algorithm>
-#include <array>
 #include <cmath>
 #include <filesystem>
 #include <memory>
@@ -19,10 +18,6 @@ namespace tool {
 namespace {
 
 using Output = std::unique_ptr<OIIO::ImageOutput>;
-
-Failure unwritable(const std::string& path, const std::string& why) {
-    return {ExitStatus::kUnwritable, "cannot write " + path + ": " + why};
-}
 
 // Formats that the image library counts as writable but that make no picture file.
 bool makesNoFile(std::string_view format) {

@@ -38,10 +38,6 @@ void watchSignals(const std::string& file) {
     }
 }
 
-Failure unwritable(const fs::path& path, const std::string& why) {
-    return {ExitStatus::kUnwritable, "cannot write " + path.string() + ": " + why};
-}
-
 fs::path followLinks(const fs::path& given) {
     constexpr int kMostLinks = 40;
     fs::path path = given;

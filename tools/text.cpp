@@ -31,10 +31,6 @@ float takeFloat(std::string_view& rest, std::string_view text, const std::string
     return value;
 }
 
-char lower(char c) {
-    return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
-}
-
 // Insertions, deletions and replacements that turn one text into the other, letter case ignored.
 size_t editDistance(std::string_view a, std::string_view b) {
     std::vector<size_t> row(b.size() + 1);
@@ -114,6 +110,10 @@ std::string join(const std::vector<std::string>& parts, std::string_view separat
         text += part;
     }
     return text;
+}
+
+char lower(char c) {
+    return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
 }
 
 std::string suggestion(std::string_view typed, const std::vector<std::string>& candidates) {

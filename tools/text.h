@@ -27,6 +27,9 @@ std::string formatTenths(double value);
 std::vector<std::string_view> split(std::string_view text, char separator);
 std::string join(const std::vector<std::string>& parts, std::string_view separator);
 
+// Of the letters A ... Z alone.
+char lower(char c);
+
 // " (did you mean NAME?)" for the candidate nearest to what was typed, or "" when none is near.
 std::string suggestion(std::string_view typed, const std::vector<std::string>& candidates);
 
