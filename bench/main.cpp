@@ -30,7 +30,8 @@ struct Options {
 constexpr char kUsage[] =
     "usage: tov_bench [--device=gpu|cpu[:INDEX]] [--benchmark_filter=REGEX] [--benchmark_out=FILE.json] ...\n"
     "Without a device: the first GPU, else the first CPU. Groups: throughput/, fusion/, arithmetic/, "
-    "first_frame/, startup/, creation/, host/.\n";
+    "first_frame/, startup/, creation/, host/.\n"
+    "Exit status: 0 done; 1 a benchmark failed, or the filter matches none.\n";
 
 Options parse(int count, char** texts) {
     Options options;
@@ -77,10 +78,10 @@ int runAll(const std::string& deviceOption) {
     registerStartup(choice);
     registerHostCost(opencl, context.get(), cache.path());
     TableReporter reporter(out, choice.text() + ", " + opencl.deviceText());
-    benchmark::RunSpecifiedBenchmarks(&reporter);
+    const size_t matched = benchmark::RunSpecifiedBenchmarks(&reporter);
     releaseThroughput();
     std::fclose(out);
-    return 0;
+    return matched > 0 && !reporter.hasFailures() ? 0 : 1;
 }
 
 }  // namespace

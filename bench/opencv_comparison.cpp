@@ -2,7 +2,8 @@
 // so that both meet the same load of the machine. Reported are the smallest times and their quotient.
 #include <benchmark/benchmark.h>
 
-#include <filesystem>
+#include <cstdio>
+#include <exception>
 #include <functional>
 #include <memory>
 #include <opencv2/imgproc.hpp>
@@ -12,6 +13,7 @@
 #include <utility>
 #include <vector>
 
+#include "child.h"
 #include "handle.h"
 #include "measure.h"
 
@@ -235,13 +237,10 @@ void addBilateral() {
     }
 }
 
-}  // namespace
-
-int main(int argc, char** argv) {
-    const auto cache = std::filesystem::temp_directory_path() / "tov-opencv-comparison";
-    std::filesystem::create_directories(cache);
-    benchmark::Initialize(&argc, argv);
-    check(tovCreateContext(TOV_API_VERSION, TOV_BACKEND_API_OPENCL, TOV_DEVICE_TYPE_CPU, 0, cache.c_str(), &context),
+int compareAll() {
+    const TemporaryDirectory cache;
+    check(tovCreateContext(TOV_API_VERSION, TOV_BACKEND_API_OPENCL, TOV_DEVICE_TYPE_CPU, 0, cache.path().c_str(),
+                           &context),
           "tovCreateContext (these comparisons need an OpenCL device of type CPU)");
     const Handle owner(context);
     cv::setNumThreads(static_cast<int>(std::thread::hardware_concurrency()));
@@ -249,8 +248,17 @@ int main(int argc, char** argv) {
     addResampling();
     addSobel();
     addBilateral();
-    benchmark::RunSpecifiedBenchmarks();
-    std::error_code ignored;
-    std::filesystem::remove_all(cache, ignored);
-    return 0;
+    return benchmark::RunSpecifiedBenchmarks() > 0 ? 0 : 1;
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+    try {
+        benchmark::Initialize(&argc, argv);
+        return compareAll();
+    } catch (const std::exception& failure) {
+        std::fprintf(stderr, "tov_opencv_comparison: %s\n", failure.what());
+        return 1;
+    }
 }

@@ -132,6 +132,7 @@ bool TableReporter::ReportContext(const Context&) {
 
 void TableReporter::ReportRuns(const std::vector<Run>& runs) {
     for (const Run& run : runs) {
+        hasFailures_ = hasFailures_ || run.error_occurred;
         for (const Group& group : groups()) {
             if (!belongs(run, group)) continue;
             if (group_ != group.prefix) printHead(out_, group);

@@ -17,10 +17,14 @@ class TableReporter : public benchmark::BenchmarkReporter {
     bool ReportContext(const Context& context) override;
     void ReportRuns(const std::vector<Run>& runs) override;
 
+    // Whether a benchmark has ended with an error so far.
+    bool hasFailures() const noexcept { return hasFailures_; }
+
  private:
     std::FILE* out_;
     std::string device_;
     std::string group_;  // prefix of the group that the latest row belongs to
+    bool hasFailures_ = false;
 };
 
 }  // namespace bench

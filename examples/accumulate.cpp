@@ -27,6 +27,8 @@ namespace {
 
 using Matrix = std::array<float, 16>;
 
+constexpr size_t kMostFrames = 100;  // the files' names have two digits
+
 void check(int32_t code, const char* what) {
     if (code != TOV_SUCCESS) throw std::runtime_error(std::string(what) + " failed with code " + std::to_string(code));
 }
@@ -105,6 +107,8 @@ std::vector<Matrix> readCameras(const std::string& path) {
 
 // Signal to noise of what a screen shows: values clamped to 0 ... 1 and raised to 1 / 2.2.
 double decibels(const Picture& picture, const Picture& reference) {
+    if (picture.width != reference.width || picture.height != reference.height)
+        throw std::runtime_error("a reference has another size than its frame");
     const auto shown = [](float value) { return std::pow(std::clamp(double{value}, 0.0, 1.0), 1.0 / 2.2); };
     double sum = 0.0;
     for (size_t i = 0; i < picture.rgba.size(); ++i)
@@ -186,12 +190,13 @@ class Sequence {
 
 void processAll(const std::string& folder, const std::string& prefix) {
     const std::vector<Matrix> cameras = readCameras(folder + "/camera.json");
+    if (cameras.size() > kMostFrames) throw std::runtime_error("more frames than two digits can number");
     Object context;
     check(tovCreateContext(TOV_API_VERSION, TOV_BACKEND_API_OPENCL, TOV_DEVICE_TYPE_CPU, 0, nullptr, context.out()),
           "tovCreateContext");
     Sequence sequence(context);
     for (size_t i = 0; i < cameras.size(); ++i) {
-        const std::string number = {static_cast<char>('0' + i / 10 % 10), static_cast<char>('0' + i % 10)};
+        const std::string number = {static_cast<char>('0' + i / 10), static_cast<char>('0' + i % 10)};
         const Picture beauty = readPicture(folder + "/beauty_" + number + ".exr");
         Picture accumulated;
         Picture filtered;
