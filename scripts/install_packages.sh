@@ -6,7 +6,7 @@ source "$(dirname "${BASH_SOURCE[0]}")/common.sh"
 # One OpenCL device is needed to run anything: PoCL makes one of the processor.
 build=(g++ cmake ninja-build pkg-config opencl-headers ocl-icd-libopencl1 pocl-opencl-icd libcli11-dev libopenimageio-dev)
 test=(libgtest-dev libbenchmark-dev oclgrind locales libegl-dev libgl-dev libgl1-mesa-dri libegl1)
-check=(clang clang-format clang-tidy clang-tools)
+check=(clang clang-format clang-tidy)
 
 wanted=()
 for group in "$@"; do
