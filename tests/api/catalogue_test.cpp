@@ -4,6 +4,7 @@
 #include <cmath>
 
 #include "fixture.h"
+#include "vectors.h"
 
 namespace apitest {
 namespace {
@@ -16,10 +17,6 @@ constexpr double kPublished = 2e-3;  // matrices of four digits
 using Formula = std::function<Rgba(const Rgba&)>;
 using Curve = std::function<double(double)>;
 
-double luminance(const Rgba& c) {
-    return 0.2126 * c[0] + 0.7152 * c[1] + 0.0722 * c[2];
-}
-
 // One function for the three colours; alpha stays.
 Formula each(const Curve& curve) {
     return [=](const Rgba& c) -> Rgba { return {curve(c[0]), curve(c[1]), curve(c[2]), c[3]}; };
@@ -27,7 +24,10 @@ Formula each(const Curve& curve) {
 
 // One function of the luminance, which scales the three colours.
 Formula scaled(const Curve& curve) {
-    return [=](const Rgba& c) { return each([&](double v) { return v * curve(luminance(c)) / luminance(c); })(c); };
+    return [=](const Rgba& c) {
+        const double y = dot(c, kLuminance);
+        return each([&](double v) { return v * curve(y) / y; })(c);
+    };
 }
 
 Formula gammaOf(double gamma) {
@@ -121,13 +121,9 @@ TEST_F(Catalogue, OfFiltersIncludesASelfTestThatEvaluatesFiveFunctionsAndWritesN
 
 TEST_F(Catalogue, OfFiltersHasASobelThatMeasuresTheGradientWithRepeatedEdges) {
     const Picture input = noise(7, 5, kFloat4, 3.0);
-    const auto l = [&](int x, int y) {
-        return luminance(input.at(uint32_t(std::clamp(x, 0, 6)), uint32_t(std::clamp(y, 0, 4))));
-    };
     const Picture expected = painted(7, 5, kFloat4, [&](int x, int y) -> Rgba {
-        const auto across = [&](int i) { return l(x + 1, y + i) - l(x - 1, y + i); };
-        const auto down = [&](int i) { return l(x + i, y + 1) - l(x + i, y - 1); };
-        const double g = std::hypot(across(-1) + 2 * across(0) + across(1), down(-1) + 2 * down(0) + down(1));
+        const auto towards = [&](int dx, int dy) { return dot(slope(input, x, y, dx, dy), kLuminance); };
+        const double g = std::hypot(towards(1, 0), towards(0, 1));
         return {g, g, g, 1.0};
     });
     // A root of a difference that cancels to 1e-7 is off by that much.

@@ -1,6 +1,9 @@
 #include "fixture.h"
 
+#include <gmock/gmock.h>
 #include <unistd.h>
+
+#include <cstdlib>
 
 namespace apitest {
 namespace {
@@ -50,6 +53,16 @@ void setAll(tov_image_filter filter, const std::vector<tov_image>& auxiliary) {
     setParameter(filter, {"inputsNum", 2u});
 }
 
+void DeviceTest::SetUp() {
+    ASSERT_NE(context(), nullptr) << "these tests need an OpenCL device of type CPU";
+    const char* const wanted = std::getenv("TOV_TEST_DEVICE");
+    if (wanted == nullptr) return;
+    uint32_t type = 0;
+    std::array<char, 256> texts = {};  // name and vendor
+    ASSERT_EQ(tovContextGetDeviceInfo(context(), &type, &texts[0], 0, &texts[128]), TOV_SUCCESS);
+    ASSERT_THAT(texts.data(), testing::HasSubstr(wanted));
+}
+
 tov_context DeviceTest::context() {
     if (shared->context == nullptr) shared->context = newContext();
     return shared->context;
@@ -85,12 +98,6 @@ Picture DeviceTest::run(uint32_t type, const Picture& input, const Parameters& p
     const Handle destination = newImage(like);
     EXPECT_EQ(execute(newFilter(type, parameters), source, destination), TOV_SUCCESS) << "filter type " << type;
     return read(destination, like);
-}
-
-Picture DeviceTest::runInPlace(uint32_t type, const Picture& input, const Parameters& parameters) {
-    const Handle image = newImage(input);
-    EXPECT_EQ(execute(newFilter(type, parameters), image, image), TOV_SUCCESS) << "filter type " << type;
-    return read(image, input);
 }
 
 }  // namespace apitest

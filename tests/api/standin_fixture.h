@@ -4,7 +4,6 @@
 #include <gmock/gmock.h>
 #include <tov/tov.h>
 
-#include <array>
 #include <string>
 #include <vector>
 

@@ -44,7 +44,7 @@ TEST(Renaming, ReplacesWholeIdentifiersTheirLayoutEndingsAndElementsOfArrays) {
 }
 
 // The inner kernel as a function, its inputs in place of the outer kernel's image, and reads of that redirected.
-TEST(Merging, GivesTheSpecifiedText) {
+TEST(Merging, GivesOneTextWithTheInnerKernelAsAFunction) {
     TovKernelCode outer = kernel({{"a", "int"}, {"srcBuffer", "srcBufferType"}, {"b", "int"}}, "\n    body;\n");
     outer.definitions = {{"X64", "X64"}};
     TovKernelCode inner = kernel({{"src10", "srcBufferType"}, {"dst10", "dstBufferType"}, {"k10", "float"}},

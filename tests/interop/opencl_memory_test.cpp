@@ -1,7 +1,7 @@
 // The host's OpenCL buffers and images as images of the library, on the real device.
 #include <gmock/gmock.h>
 
-#include "../api/fixture.h"
+#include "fixture.h"
 #include "zor/opencl.h"
 
 namespace apitest {

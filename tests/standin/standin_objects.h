@@ -3,7 +3,6 @@
 
 #include "standin.h"
 
-#include <algorithm>
 #include <cstdlib>
 #include <memory>
 #include <typeinfo>

@@ -1,4 +1,4 @@
-// Device memory: the budget, the kinds, mapping and copying.
+// Device memory: the budget, buffers of the exact maximum, mapping and copying.
 #include "fixture.h"
 
 using testing::ElementsAre;

@@ -1,4 +1,4 @@
-// Device information, limits, events, queue priority, adoption and the host device.
+// Limits and texts of devices, events, queue priority and adoption.
 #include <sys/resource.h>
 #include <sys/syscall.h>
 
