@@ -44,7 +44,7 @@ DeviceChoice chooseDevice(std::string_view option) {
     if (option.empty()) return firstDevice();
     const size_t colon = option.find(':');
     const uint32_t type = parseType(option.substr(0, colon));
-    const uint32_t index = colon == option.npos ? 0 : parseIndex(option.substr(colon + 1));
+    const uint32_t index = colon == std::string_view::npos ? 0 : parseIndex(option.substr(colon + 1));
     if (index >= deviceCount(type)) throw std::runtime_error("There is no OpenCL device " + std::string(option));
     return {type, index};
 }
