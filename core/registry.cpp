@@ -3,23 +3,17 @@
 #include <memory>
 #include <vector>
 
+#include "zor/freed_at_unload.h"
+
 namespace {
 
 uint64_t nextSerial = 1;
 
 std::vector<TovObject*>* live = nullptr;
 
-// The list alone is freed when the library is unloaded. Objects still in it are left to the host's exit: destroying
-// them then could call into a driver that is already gone. A host that calls from its own exit handlers finds no object
-// from before, instead of freed memory, and its new ones get a new list. The pointer lies outside, for a compiler may
-// drop what a destructor stores in its own object.
-struct ListOwner {
-    ~ListOwner() {
-        delete live;
-        live = nullptr;
-    }
-};
-const ListOwner listOwner{};
+// The list alone is freed. Objects still in it are left to the host's exit: destroying them then could call into a
+// driver that is already gone. Exit handlers find no object from before, instead of freed memory.
+const FreedAtUnload<std::vector<TovObject*>> listOwner{live};
 
 size_t size() noexcept {
     return live == nullptr ? 0 : live->size();

@@ -4,6 +4,7 @@
 #include "filters/area_table.h"
 #include "filters/descriptions.h"
 #include "filters/value_checks.h"
+#include "zor/freed_at_unload.h"
 
 namespace {
 
@@ -93,7 +94,9 @@ PassSpec waveletLevel(uint32_t level, const char* offset) {
 
 // ---- The table ----
 
-std::array<FilterSpec, kFilterTypes> makeCatalogue() {
+using Catalogue = std::array<FilterSpec, kFilterTypes>;
+
+Catalogue makeCatalogue() {
     return {{
         {.type = TOV_IMAGE_FILTER_MATH_TEST,
          .sizeRule = SizeRule::Unchecked,
@@ -346,11 +349,13 @@ std::array<FilterSpec, kFilterTypes> makeCatalogue() {
     }};
 }
 
+Catalogue* catalogue = nullptr;
+const FreedAtUnload<Catalogue> catalogueOwner{catalogue};
+
 }  // namespace
 
 const FilterSpec& filterSpec(uint32_t type) {
-    // Never destroyed: filters keep their rows, and hosts make and run filters in their own exit handlers, too.
-    static const auto& catalogue = *new std::array<FilterSpec, kFilterTypes>(makeCatalogue());
-    if (type >= catalogue.size()) throw TovException{TOV_ERROR_INVALID_OPERATION};
-    return catalogue[type];
+    if (type >= kFilterTypes) throw TovException{TOV_ERROR_INVALID_OPERATION};
+    if (catalogue == nullptr) catalogue = new Catalogue(makeCatalogue());
+    return (*catalogue)[type];
 }

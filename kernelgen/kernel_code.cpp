@@ -6,6 +6,7 @@
 #include <regex>
 
 #include "kernelgen/sources.h"
+#include "zor/freed_at_unload.h"
 
 namespace {
 
@@ -83,6 +84,11 @@ std::string_view bodyOf(std::string_view text) noexcept {
     return {};
 }
 
+using ParsedKernels = std::map<std::pair<std::string, std::string>, TovKernelCode>;  // by source and kernel
+
+ParsedKernels* parsed = nullptr;
+const FreedAtUnload<ParsedKernels> parsedOwner{parsed};
+
 }  // namespace
 
 std::string TovKernelVariable::text() const {
@@ -108,11 +114,10 @@ void ParseKernel(TovKernelCode& code, const std::string& kernelName, std::string
 }
 
 const TovKernelCode& embeddedKernelCode(const std::string& sourceName, const std::string& kernelName) {
-    // Never destroyed: hosts make and run filters in their own exit handlers, too.
-    static auto& parsed = *new std::map<std::pair<std::string, std::string>, TovKernelCode>;
+    if (parsed == nullptr) parsed = new ParsedKernels;
     const std::pair key(sourceName, kernelName);
-    if (const auto known = parsed.find(key); known != parsed.end()) return known->second;
+    if (const auto known = parsed->find(key); known != parsed->end()) return known->second;
     TovKernelCode code;
     ParseKernel(code, kernelName, findKernelSource(sourceName));
-    return parsed.emplace(key, std::move(code)).first->second;
+    return parsed->emplace(key, std::move(code)).first->second;
 }

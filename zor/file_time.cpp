@@ -13,6 +13,8 @@
 #include <sys/stat.h>
 #endif
 
+#include "zor/freed_at_unload.h"
+
 namespace zor {
 namespace {
 
@@ -72,12 +74,20 @@ std::string carrierPath() {
 }
 #endif
 
-// The library file that carries this code. Its name may be relative to the directory that the host was in when it
-// loaded us, so it is resolved then. Never destroyed: hosts call in their own exit handlers, too.
-const std::string& libraryFile = *[] {
+std::string* resolvedCarrier() {
     std::error_code error;
     return new std::string(std::filesystem::absolute(carrierPath(), error).string());
-}();
+}
+
+// Its name may be relative to the directory that the host was in when it loaded us, so it is resolved then.
+std::string* carrier = resolvedCarrier();
+const FreedAtUnload<std::string> carrierOwner{carrier};
+
+// The library file that carries this code.
+const std::string& libraryFile() {
+    if (carrier == nullptr) carrier = resolvedCarrier();
+    return *carrier;
+}
 
 // 0 when the path is a file that can be read, otherwise the system's error. Pipes and devices, which could block, are
 // never opened.
@@ -111,7 +121,7 @@ bool fileExists(const std::string& path) {
 }
 
 FileTime libraryTime() {
-    const FileTimes times = timesOf(libraryFile);
+    const FileTimes times = timesOf(libraryFile());
     return std::max(times.modified, times.changed);
 }
 
