@@ -214,14 +214,13 @@ __kernel void ExponentialToneMappingKernel(srcBufferType(srcBuffer), dstBufferTy
 }
 
 // Of eight pixels of a row: the differences of the luminances on both sides, and the sums, weighted 1, 2, 1.
-INLINED void CompareLuminances(srcBufferType(srcBuffer), int2 at, int count, int last, float8* differences,
-                               float8* sums) {
+INLINED void CompareLuminances(srcBufferType(srcBuffer), int2 at, int width, float8* differences, float8* sums) {
     float16 left;
     float16 right;
-    ReadEight(srcBuffer, at, count, &left, &right);
+    ReadEight(srcBuffer, at, min(8, width - at.x), &left, &right);
     const float8 own = LuminancesOf8(left, right);
     const float8 before = (float8)(Luminance(ReadPixel(srcBuffer, max(at.x - 1, 0), at.y)), own.s0123, own.s456);
-    const float8 behind = (float8)(own.s1234, own.s567, Luminance(ReadPixel(srcBuffer, min(at.x + 8, last), at.y)));
+    const float8 behind = (float8)(own.s1234, own.s567, Luminance(ReadPixel(srcBuffer, min(at.x + 8, width - 1), at.y)));
     *differences = behind - before;
     *sums = before + 2.0f * own + behind;
 }
@@ -232,29 +231,29 @@ INLINED void CompareLuminances(srcBufferType(srcBuffer), int2 at, int count, int
 // An item takes a block of 64 columns and 8 rows, row after row, and keeps what it found in two rows for the next.
 __kernel void SobelOperatorKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer)) {
     const int2 size = GET_BUFFER_SIZE(dstBuffer);
+    const int2 launched = LaunchedPixels(size);
     const int2 corner = (int2)((int)get_global_id(0), (int)get_global_id(1));
-    if (corner.x % (8 * SOBEL_EIGHTS) != 0 || corner.y % SOBEL_ROWS != 0 || corner.x >= size.x || corner.y >= size.y) {
+    if (corner.x % (8 * SOBEL_EIGHTS) != 0 || corner.y % SOBEL_ROWS != 0 || any(corner >= launched)) {
         return;
     }
     float8 differences[2][SOBEL_EIGHTS];
     float8 sums[2][SOBEL_EIGHTS];
-    const int eights = min(SOBEL_EIGHTS, (size.x - 1 - corner.x) / 8 + 1);
-    const int rows = min(SOBEL_ROWS, size.y - corner.y);
+    const int eights = min(SOBEL_EIGHTS, (launched.x - 1 - corner.x) / 8 + 1);
+    const int rows = min(SOBEL_ROWS, launched.y - corner.y);
     for (int j = -1; j <= rows; ++j) {
         const int row = clamp(corner.y + j, 0, size.y - 1);
         const int slot = j & 1;
         for (int k = 0; k < eights; ++k) {
             const int x = corner.x + 8 * k;
-            const int count = min(8, size.x - x);
             float8 difference;
             float8 sum;
-            CompareLuminances(srcBuffer, (int2)(x, row), count, size.x - 1, &difference, &sum);
+            CompareLuminances(srcBuffer, (int2)(x, row), size.x, &difference, &sum);
             if (j > 0) {
                 const float8 horizontal = differences[slot][k] + 2.0f * differences[1 - slot][k] + difference;
                 const float8 vertical = sums[slot][k] - sum;
                 const float8 lengths = native_sqrt(horizontal * horizontal + vertical * vertical);
-                WriteEight(dstBuffer, (int2)(x, corner.y + j - 1), count, Opaque(lengths.lo.s0000111122223333),
-                           Opaque(lengths.hi.s0000111122223333));
+                WriteEight(dstBuffer, (int2)(x, corner.y + j - 1), min(8, launched.x - x),
+                           Opaque(lengths.lo.s0000111122223333), Opaque(lengths.hi.s0000111122223333));
             }
             differences[slot][k] = difference;
             sums[slot][k] = sum;

@@ -61,12 +61,17 @@ INLINED void WriteFour_float_4(__global float4* buffer, int2 bufferSize, int x, 
 #define WriteFour(buffer, x, y, rgba) \
     WriteFour_(buffer##_COMP_TYPE, buffer##_COMP_NUM, buffer, buffer##_Res, x, y, rgba)
 
-// Where the eight pixels numbered k of the item at the corner of an 8 x 8 block begin. The item takes as many as the
-// block has, but in the order of the rows: memory is read as it lies. Counted on, y may lie below the picture.
-INLINED int2 EightOfBlock(int2 corner, int2 size, int k) {
-    const int across = (size.x - 1) / 8 + 1;
-    const long eight = 8 * ((long)(corner.y / 8) * across + corner.x / 8) + k;
-    return (int2)(8 * (int)(eight % across), (int)(eight / across));
+// The pixels that a launch covers, which may be a part of the picture.
+INLINED int2 LaunchedPixels(int2 size) {
+    return (int2)((int)min((size_t)size.x, get_global_size(0)), (int)min((size_t)size.y, get_global_size(1)));
+}
+
+// Where the eight pixels numbered k of the item at the corner of an 8 x 8 block begin. The items of eight rows take as
+// many as their blocks have, but in the order of the rows: memory is read as it lies.
+INLINED int2 EightOfBlock(int2 corner, int2 launched, int k) {
+    const int across = (launched.x - 1) / 8 + 1;
+    const int eight = corner.x + k;
+    return (int2)(8 * (eight % across), corner.y + eight / across);
 }
 
 // Eight pixels of a row, RGBA after RGBA. Only the first `count` lie in the picture: the last of them is repeated.
@@ -100,23 +105,23 @@ INLINED void WriteEight(dstBufferType(dstBuffer), int2 at, int count, float16 le
 
 // The body of a kernel that computes each pixel of dstBuffer from the same of srcBuffer: the statements `shade` find
 // eight pixels in left and right and leave the results there.
-#define SHADE_ROWS(shade)                                                                     \
-    const int2 size = GET_BUFFER_SIZE(dstBuffer);                                             \
-    const int2 corner = (int2)((int)get_global_id(0), (int)get_global_id(1));                 \
-    if (corner.x % 8 != 0 || corner.y % 8 != 0 || corner.x >= size.x || corner.y >= size.y) { \
-        return;                                                                               \
-    }                                                                                         \
-    for (int k = 0; k < 8; ++k) {                                                             \
-        const int2 at = EightOfBlock(corner, size, k);                                        \
-        if (at.y >= size.y) {                                                                 \
-            return;                                                                           \
-        }                                                                                     \
-        const int count = min(8, size.x - at.x);                                              \
-        float16 left;                                                                         \
-        float16 right;                                                                        \
-        ReadEight(srcBuffer, at, count, &left, &right);                                       \
-        shade;                                                                                \
-        WriteEight(dstBuffer, at, count, left, right);                                        \
+#define SHADE_ROWS(shade)                                                     \
+    const int2 launched = LaunchedPixels(GET_BUFFER_SIZE(dstBuffer));         \
+    const int2 corner = (int2)((int)get_global_id(0), (int)get_global_id(1)); \
+    if (corner.x % 8 != 0 || corner.y % 8 != 0 || any(corner >= launched)) {  \
+        return;                                                               \
+    }                                                                         \
+    for (int k = 0; k < 8; ++k) {                                             \
+        const int2 at = EightOfBlock(corner, launched, k);                    \
+        if (at.y >= launched.y) {                                             \
+            return;                                                           \
+        }                                                                     \
+        const int count = min(8, launched.x - at.x);                          \
+        float16 left;                                                         \
+        float16 right;                                                        \
+        ReadEight(srcBuffer, at, count, &left, &right);                       \
+        shade;                                                                \
+        WriteEight(dstBuffer, at, count, left, right);                        \
     }
 
 INLINED float8 SumsOfPairs(float16 values) {

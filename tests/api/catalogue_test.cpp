@@ -54,7 +54,7 @@ Rgba shadow(const Rgba& c) {
 }
 
 Picture beginning(const std::vector<float>& values) {
-    Picture picture = noise(7, 5, kFloat4, 3.0);
+    Picture picture = noise(75, 21, kFloat4, 3.0);
     std::copy(values.begin(), values.end(), picture.values.begin());
     return picture;
 }
@@ -112,22 +112,41 @@ TEST_F(Catalogue, OfPerPixelFiltersFollowsTheFormulasAndStaysFiniteWhereTheseDiv
 }
 
 TEST_F(Catalogue, OfFiltersIncludesASelfTestThatEvaluatesFiveFunctionsAndWritesNothingElse) {
-    Picture expected = noise(7, 5);
+    Picture expected = noise(75, 21);
     std::ranges::copy(std::array{0.25f, 9.0f, std::exp2(2.5f), std::log(5.0f), std::exp(1.5f)}, &expected.values[0]);
-    const Picture output = run(TOV_IMAGE_FILTER_MATH_TEST, beginning({4, 3, 2, 5, 1.5f}), {}, noise(7, 5));
+    const Picture output = run(TOV_IMAGE_FILTER_MATH_TEST, beginning({4, 3, 2, 5, 1.5f}), {}, noise(75, 21));
     EXPECT_LT(maxRelativeDifference(output, expected), 1e-5);
     EXPECT_EQ(output.at(6, 4), expected.at(6, 4));
 }
 
 TEST_F(Catalogue, OfFiltersHasASobelThatMeasuresTheGradientWithRepeatedEdges) {
-    const Picture input = noise(7, 5, kFloat4, 3.0);
-    const Picture expected = painted(7, 5, kFloat4, [&](int x, int y) -> Rgba {
+    const Picture input = noise(75, 21, kFloat4, 3.0);
+    const Picture expected = painted(75, 21, kFloat4, [&](int x, int y) -> Rgba {
         const auto towards = [&](int dx, int dy) { return dot(slope(input, x, y, dx, dy), kLuminance); };
         const double g = std::hypot(towards(1, 0), towards(0, 1));
         return {g, g, g, 1.0};
     });
     // A root of a difference that cancels to 1e-7 is off by that much.
     EXPECT_LT(maxDifference(run(TOV_IMAGE_FILTER_SOBEL, input), expected), 1e-5);
+}
+
+TEST_F(Catalogue, OfPerPixelFiltersTakesAPartOfTheOutputAndLeavesTheRest) {
+    const Picture input = noise(75, 21);
+    const Picture before = noise(75, 21, kFloat4, 1.0, 2);
+    for (const uint32_t type :
+         {TOV_IMAGE_FILTER_LINEAR_TONEMAP, TOV_IMAGE_FILTER_GAMMA_CORRECTION, TOV_IMAGE_FILTER_SIMPLE_TONEMAP,
+          TOV_IMAGE_FILTER_REINHARD_TONEMAP, TOV_IMAGE_FILTER_SHADOW_CATCHER, TOV_IMAGE_FILTER_SOBEL}) {
+        const Picture whole = run(type, input);
+        const Handle source = newImage(input);
+        const Handle output = newImage(before);
+        const Handle filter = newFilter(type);
+        const Handle queue = newQueue();
+        ASSERT_EQ(tovCommandQueueAttachImageFilter(queue, filter, source, output), TOV_SUCCESS);
+        ASSERT_EQ(tovImageFilterSetParameter2u(filter, "dstRec", 24, 16), TOV_SUCCESS);
+        ASSERT_EQ(tovContextExecuteCommandQueue(context(), queue, nullptr, nullptr), TOV_SUCCESS);
+        const auto color = [&](uint32_t x, uint32_t y) { return (x < 24 && y < 16 ? whole : before).at(x, y); };
+        EXPECT_EQ(maxDifference(read(output, before), painted(75, 21, kFloat4, color)), 0.0) << type;
+    }
 }
 
 TEST_F(Catalogue, OfFiltersAddsAndMultipliesUpToSixImagesAndReadsGapsAsZero) {
