@@ -64,10 +64,15 @@ __kernel void ResampleKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer),
 #else
 
 #define BLOCK_SIDE 8
-#define LEAVE_UNLESS_CORNER(corner, limits)                                                                         \
-    if (corner.x % BLOCK_SIDE != 0 || corner.y % BLOCK_SIDE != 0 || corner.x >= limits.x || corner.y >= limits.y) { \
-        return;                                                                                                     \
-    }
+// The beginning of a kernel: the item at the corner of a block goes on, with the part of the output to write and the
+// part of the source to read.
+#define BEGIN_BLOCK                                                                               \
+    const int2 limits = min(cDstRes, GET_BUFFER_SIZE(dstBuffer));                                 \
+    const int2 corner = (int2)((int)get_global_id(0), (int)get_global_id(1));                     \
+    if (corner.x % BLOCK_SIDE != 0 || corner.y % BLOCK_SIDE != 0 || any(corner >= limits) != 0) { \
+        return;                                                                                   \
+    }                                                                                             \
+    const int2 extent = max(min(cSrcRes, GET_BUFFER_SIZE(srcBuffer)), (int2)(0));
 
 #if INTERPOLATION_OPERATOR == 0
 // Where the source pixels of an output column or row begin; sizes that a host overrides may be of any magnitude.
@@ -90,10 +95,7 @@ INLINED float4 AverageOf(srcBufferType(srcBuffer), int left, int right, int top,
 // as it lies.
 __kernel void ResampleKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), int2 cSrcRes, int2 cDstRes,
                              float2 cRatio) {
-    const int2 limits = min(cDstRes, GET_BUFFER_SIZE(dstBuffer));
-    const int2 corner = (int2)((int)get_global_id(0), (int)get_global_id(1));
-    LEAVE_UNLESS_CORNER(corner, limits)
-    const int2 extent = max(min(cSrcRes, GET_BUFFER_SIZE(srcBuffer)), (int2)(0));
+    BEGIN_BLOCK
     const int across = (limits.x - 1) / BLOCK_SIDE + 1;
     const long block = (long)(corner.y / BLOCK_SIDE) * across + corner.x / BLOCK_SIDE;
     long place = block * BLOCK_SIDE * BLOCK_SIDE;
@@ -158,6 +160,7 @@ static inline void FindSamples(Samples* samples, int position, int size, float r
     samples->weight[3] = (0.5f * t - 0.5f) * t * t;
 #endif
 }
+
 // One source row at the columns of a block.
 INLINED void InterpolateRow(srcBufferType(srcBuffer), const Samples* across, int row, float4* line) {
     for (int i = 0; i < BLOCK_SIDE; ++i) {
@@ -171,10 +174,7 @@ INLINED void InterpolateRow(srcBufferType(srcBuffer), const Samples* across, int
 
 __kernel void ResampleKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer), int2 cSrcRes, int2 cDstRes,
                              float2 cRatio) {
-    const int2 limits = min(cDstRes, GET_BUFFER_SIZE(dstBuffer));
-    const int2 corner = (int2)((int)get_global_id(0), (int)get_global_id(1));
-    LEAVE_UNLESS_CORNER(corner, limits)
-    const int2 extent = max(min(cSrcRes, GET_BUFFER_SIZE(srcBuffer)), (int2)(0));
+    BEGIN_BLOCK
     // All eight columns are computed: loops of known length. Those behind the picture repeat its last one.
     Samples across[BLOCK_SIDE];
     for (int i = 0; i < BLOCK_SIDE; ++i) {
