@@ -83,7 +83,7 @@ __kernel void BilateralFilterKernel(srcBufferType(srcBuffer), dstBufferType(dstB
             for (int i = 0; i <= 2 * radius; ++i) {
                 float8 weight = (float8)(0.0f);
                 REPEAT(INPUTS_NUM, ADD_DISTANCE)
-                weight = Exp2Of8(fmax(weight, -126.0f));
+                weight = Exp2_float8(fmax(weight, -126.0f));
                 red += EIGHT(3 * INPUTS_NUM, i) * weight;
                 green += EIGHT(3 * INPUTS_NUM + 1, i) * weight;
                 blue += EIGHT(3 * INPUTS_NUM + 2, i) * weight;

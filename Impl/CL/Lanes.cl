@@ -8,8 +8,8 @@
 #define LANE(value, k) value.s##k
 #define AS_FLOATS as_float8
 #define AS_INTS as_int8
-#define LOG2 Log2Of8
-#define EXP2 Exp2Of8
+#define LOG2 Log2_float8
+#define EXP2 Exp2_float8
 typedef float8 Floats;
 typedef int8 Ints;
 #else

@@ -7,7 +7,7 @@ __kernel void WeightedSumKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffe
     int2 coord;
     GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
     float4 result = (float4)(0.0f);
-#define ADD_WEIGHTED(itr) result += ReadPixel(input##itr, coord.x, coord.y) * weight##itr;
+#define ADD_WEIGHTED(itr) result = AddWeighted(result, ReadPixel(input##itr, coord.x, coord.y), weight##itr);
     REPEAT(INPUTS_NUM, ADD_WEIGHTED)
 #undef ADD_WEIGHTED
     WritePixel(dstBuffer, coord.x, coord.y, result);
@@ -18,7 +18,7 @@ __kernel void MultiplicationKernel(srcBufferType(srcBuffer), dstBufferType(dstBu
     int2 coord;
     GET_COORD(coord, GET_BUFFER_SIZE(dstBuffer));
     float4 result = (float4)(1.0f);
-#define MULTIPLY_BY(itr) result *= ReadPixel(input##itr, coord.x, coord.y);
+#define MULTIPLY_BY(itr) result = Multiplied(result, ReadPixel(input##itr, coord.x, coord.y));
     REPEAT(INPUTS_NUM, MULTIPLY_BY)
 #undef MULTIPLY_BY
     WritePixel(dstBuffer, coord.x, coord.y, result);

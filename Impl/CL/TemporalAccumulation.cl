@@ -20,31 +20,6 @@
 #define SLICE_MOMENTS_OUT 5
 #define SLICE_COLORS_OUT 6
 
-#ifdef MOTION_BUFFER
-// Displacement of a point on the screen, 0 to 1 across it, from the current to the previous camera. A point in the
-// plane of either camera is nowhere on the screen: its motion is NaN.
-__kernel void GenerateMotionBuffer(srcBufferType(positions), dstBufferType(motion), float16 prev_view_projection,
-                                   float16 view_projection) {
-    int2 coord;
-    GET_COORD(coord, GET_BUFFER_SIZE(motion));
-    const float4 stored = ReadPixel(positions, coord.x, coord.y);
-    const float4 usable = IsUsable(stored) ? stored : (float4)(0.0f);
-    const float4 world = (float4)(usable.xyz / fmax(usable.w, 1.0f), 1.0f);
-    const float2 now = (float2)(dot(view_projection.s0123, world), dot(view_projection.s4567, world));
-    const float now_w = dot(view_projection.scdef, world);
-    const float2 before = (float2)(dot(prev_view_projection.s0123, world), dot(prev_view_projection.s4567, world));
-    const float before_w = dot(prev_view_projection.scdef, world);
-    const bool projectable = now_w != 0.0f && before_w != 0.0f;
-    const float2 shift = (before / (projectable ? before_w : 1.0f) - now / (projectable ? now_w : 1.0f)) *
-                         (float2)(0.5f, -0.5f);
-    // Chosen among bits: among floats relaxed math may drop the NaN.
-    const uint2 bits = projectable ? as_uint2(shift) : (uint2)(0x7fc00000u);
-    const float2 shown = world.x != 0.0f || world.y != 0.0f || world.z != 0.0f ? as_float2(bits) : (float2)(0.0f);
-    const float4 result = (float4)(shown, 0.0f, 1.0f);
-    WritePixel(motion, coord.x, coord.y, result);
-}
-#endif
-
 #if defined(TEMPORAL_ACCUMULATION) || defined(COPY)
 static inline float4 UsableOrZero(float4 value) {
     return IsUsable(value) ? value : (float4)(0.0f);
