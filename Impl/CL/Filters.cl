@@ -181,9 +181,7 @@ INLINED void FindLuminances(srcBufferType(srcBuffer), int row, int first, int co
 }
 
 __kernel void SobelOperatorKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer)) {
-    if (get_local_id(0) != 0 || get_local_id(1) != 0) {
-        return;
-    }
+    FIRST_OF_GROUP_ONLY
     const int2 size = GET_BUFFER_SIZE(dstBuffer);
     const int2 launched = LaunchedPixels(size);
     const int2 corner = (int2)((int)get_global_id(0), (int)get_global_id(1));

@@ -67,6 +67,7 @@ __kernel void ResampleKernel(srcBufferType(srcBuffer), dstBufferType(dstBuffer),
 // The beginning of a kernel: the item at the corner of a block goes on, with the part of the output to write and the
 // part of the source to read.
 #define BEGIN_BLOCK                                                                               \
+    FIRST_OF_GROUP_ONLY                                                                           \
     const int2 limits = min(cDstRes, GET_BUFFER_SIZE(dstBuffer));                                 \
     const int2 corner = (int2)((int)get_global_id(0), (int)get_global_id(1));                     \
     if (corner.x % BLOCK_SIDE != 0 || corner.y % BLOCK_SIDE != 0 || any(corner >= limits) != 0) { \

@@ -128,12 +128,16 @@ static inline int2 LaunchedPixels(int2 size) {
 #define PIXELS_ARE_INDEPENDENT
 #endif
 
-// One item of a group takes the pixels of all. The groups of some rows have as many items as these rows have pixels, or
+// Leaves the kernel's work to the first item of a group.
+#define FIRST_OF_GROUP_ONLY                             \
+    if (get_local_id(0) != 0 || get_local_id(1) != 0) { \
+        return;                                         \
+    }
+
+// That item takes the pixels of all. The groups of some rows have as many items as these rows have pixels, or
 // more, and take them in the order of the rows, in which `place` counts: memory is read as it lies.
 #define TAKE_PIXELS_OF_GROUP(coord, limits)                                                          \
-    if (get_local_id(0) != 0 || get_local_id(1) != 0) {                                              \
-        return;                                                                                      \
-    }                                                                                                \
+    FIRST_OF_GROUP_ONLY                                                                              \
     const int2 launched = LaunchedPixels(limits);                                                    \
     const int2 corner = (int2)((int)get_global_id(0), (int)get_global_id(1));                        \
     const ulong width = (ulong)launched.x;                                                           \
@@ -164,69 +168,17 @@ static inline int2 LaunchedPixels(int2 size) {
 #endif
 
 // ---- Components in memory ------------------------------------------------------------------------------------------
-// LOAD_N(type, buffer, i) and STORE_N(type, buffer, i, values): the N components of pixel i as floats.
+// HOW_LOAD_N(type, buffer, i) and HOW_STORE_N(type, buffer, i, values): the N components of pixel i as floats, at once
+// (VECTOR) or one by one (SINGLY), for loops of which compilers make vectors.
 
 // 0 ... 1 to 0 ... 255, rounded to nearest even: at 2^23 the digits of a float are whole numbers, and the last eight
 // are the byte. Conversions that round and saturate are several times slower on central processors.
 #define AS_BYTE_DIGITS(clamped) ((clamped)*255.0f + 8388608.0f)
 
-#if ON_CENTRAL_PROCESSOR
-// One by one: vectors of pixels are made of them, whose shuffles compilers put in place.
-#define LOAD_uint(buffer, i) ((float)((__global const uchar*)(buffer))[i] * (1.0f / 255.0f))
-#define LOAD_half(buffer, i) vload_half(i, (__global const half*)(buffer))
-#define LOAD_float(buffer, i) ((__global const float*)(buffer))[i]
-#define LOAD_1(type, buffer, i) LOAD_##type(buffer, i)
-#define LOAD_2(type, buffer, i) ((float2)(LOAD_##type(buffer, 2 * (i)), LOAD_##type(buffer, 2 * (i) + 1)))
-#define LOAD_3(type, buffer, i) \
-    ((float3)(LOAD_##type(buffer, 3 * (i)), LOAD_##type(buffer, 3 * (i) + 1), LOAD_##type(buffer, 3 * (i) + 2)))
-#define LOAD_4(type, buffer, i) LOAD_4_##type(buffer, i)
-#define LOAD_4_uint(buffer, i) ((float4)(LOAD_2(uint, buffer, 2 * (i)), LOAD_2(uint, buffer, 2 * (i) + 1)))
-#define LOAD_4_half(buffer, i) ((float4)(LOAD_2(half, buffer, 2 * (i)), LOAD_2(half, buffer, 2 * (i) + 1)))
-
-// As pairs, which take fewer shuffles.
-typedef ulong PairOfFloats __attribute__((may_alias));
-static inline float4 LOAD_4_float(__global const void* buffer, size_t i) {
-    const ulong low = ((__global const PairOfFloats*)buffer)[2 * i];
-    const ulong high = ((__global const PairOfFloats*)buffer)[2 * i + 1];
-    return (float4)(as_float((uint)low), as_float((uint)(low >> 32)), as_float((uint)high),
-                    as_float((uint)(high >> 32)));
-}
-
-static inline uchar ToByte(float value) {
-    const float positive = value > 0.0f ? value : 0.0f;
-    return (uchar)as_uint(AS_BYTE_DIGITS(positive < 1.0f ? positive : 1.0f));
-}
-#define STORE_uint(buffer, i, value) ((__global uchar*)(buffer))[i] = ToByte(value)
-// Rounded to nearest even, without the branches of the library's function. Halves too small for a whole mantissa have
-// the steps of floats from 0.5 on; what is too large becomes infinite.
-static inline ushort ToHalf(float value) {
-    const uint bits = as_uint(value);
-    const uint magnitude = bits & 0x7fffffffu;
-    const uint bounded = min(magnitude, 0x47800000u);
-    const uint normal = (bounded - 0x37fff001u + (magnitude >> 13 & 1u)) >> 13;
-    const uint small = as_uint(as_float(magnitude) + 0.5f) - 0x3f000000u;
-    const uint nan = magnitude > 0x7f800000u ? 0x200u : 0u;
-    return (ushort)((bits >> 16 & 0x8000u) | (magnitude < 0x38800000u ? small : normal) | nan);
-}
-#define STORE_half(buffer, i, value) ((__global ushort*)(buffer))[i] = ToHalf(value)
-#define STORE_float(buffer, i, value) ((__global float*)(buffer))[i] = value
-#define STORE_1(type, buffer, i, value) STORE_##type(buffer, i, value)
-#define STORE_2(type, buffer, i, values)       \
-    STORE_##type(buffer, 2 * (i), (values).x); \
-    STORE_##type(buffer, 2 * (i) + 1, (values).y)
-#define STORE_3(type, buffer, i, values)           \
-    STORE_##type(buffer, 3 * (i), (values).x);     \
-    STORE_##type(buffer, 3 * (i) + 1, (values).y); \
-    STORE_##type(buffer, 3 * (i) + 2, (values).z)
-#define STORE_4(type, buffer, i, values)         \
-    STORE_2(type, buffer, 2 * (i), (values).xy); \
-    STORE_2(type, buffer, 2 * (i) + 1, (values).zw)
-
-#else
-#define LOAD_1(type, buffer, i) LOAD_1_##type(buffer, i)
-#define LOAD_2(type, buffer, i) LOAD_2_##type(buffer, i)
-#define LOAD_3(type, buffer, i) LOAD_3_##type(buffer, i)
-#define LOAD_4(type, buffer, i) LOAD_4_##type(buffer, i)
+#define VECTOR_LOAD_1(type, buffer, i) LOAD_1_##type(buffer, i)
+#define VECTOR_LOAD_2(type, buffer, i) LOAD_2_##type(buffer, i)
+#define VECTOR_LOAD_3(type, buffer, i) LOAD_3_##type(buffer, i)
+#define VECTOR_LOAD_4(type, buffer, i) LOAD_4_##type(buffer, i)
 #define LOAD_1_uint(buffer, i) (convert_float(((__global const uchar*)(buffer))[i]) * (1.0f / 255.0f))
 #define LOAD_2_uint(buffer, i) (convert_float2(((__global const uchar2*)(buffer))[i]) * (1.0f / 255.0f))
 #define LOAD_3_uint(buffer, i) (convert_float3(vload3(i, (__global const uchar*)(buffer))) * (1.0f / 255.0f))
@@ -243,10 +195,10 @@ static inline ushort ToHalf(float value) {
 static inline uchar4 ToBytes(float4 values) {
     return convert_uchar4(as_uint4(AS_BYTE_DIGITS(clamp(values, 0.0f, 1.0f))));
 }
-#define STORE_1(type, buffer, i, value) STORE_1_##type(buffer, i, value)
-#define STORE_2(type, buffer, i, values) STORE_2_##type(buffer, i, values)
-#define STORE_3(type, buffer, i, values) STORE_3_##type(buffer, i, values)
-#define STORE_4(type, buffer, i, values) STORE_4_##type(buffer, i, values)
+#define VECTOR_STORE_1(type, buffer, i, value) STORE_1_##type(buffer, i, value)
+#define VECTOR_STORE_2(type, buffer, i, values) STORE_2_##type(buffer, i, values)
+#define VECTOR_STORE_3(type, buffer, i, values) STORE_3_##type(buffer, i, values)
+#define VECTOR_STORE_4(type, buffer, i, values) STORE_4_##type(buffer, i, values)
 #define STORE_1_uint(buffer, i, value) ((__global uchar*)(buffer))[i] = ToBytes((float4)(value)).x
 #define STORE_2_uint(buffer, i, values) ((__global uchar2*)(buffer))[i] = ToBytes((float4)(values, 0.0f, 0.0f)).xy
 #define STORE_3_uint(buffer, i, values) vstore3(ToBytes((float4)(values, 0.0f)).xyz, i, (__global uchar*)(buffer))
@@ -259,6 +211,62 @@ static inline uchar4 ToBytes(float4 values) {
 #define STORE_2_float(buffer, i, values) ((__global float2*)(buffer))[i] = values
 #define STORE_3_float(buffer, i, values) vstore3(values, i, (__global float*)(buffer))
 #define STORE_4_float(buffer, i, values) ((__global float4*)(buffer))[i] = values
+
+#if ON_CENTRAL_PROCESSOR
+#define LOAD_uint(buffer, i) ((float)((__global const uchar*)(buffer))[i] * (1.0f / 255.0f))
+#define LOAD_half(buffer, i) vload_half(i, (__global const half*)(buffer))
+#define LOAD_float(buffer, i) ((__global const float*)(buffer))[i]
+#define SINGLY_LOAD_1(type, buffer, i) LOAD_##type(buffer, i)
+#define SINGLY_LOAD_2(type, buffer, i) ((float2)(LOAD_##type(buffer, 2 * (i)), LOAD_##type(buffer, 2 * (i) + 1)))
+#define SINGLY_LOAD_3(type, buffer, i) \
+    ((float3)(LOAD_##type(buffer, 3 * (i)), LOAD_##type(buffer, 3 * (i) + 1), LOAD_##type(buffer, 3 * (i) + 2)))
+#define SINGLY_LOAD_4(type, buffer, i) LOAD_SINGLY_4_##type(buffer, i)
+#define LOAD_SINGLY_4_uint(buffer, i) \
+    ((float4)(SINGLY_LOAD_2(uint, buffer, 2 * (i)), SINGLY_LOAD_2(uint, buffer, 2 * (i) + 1)))
+#define LOAD_SINGLY_4_half(buffer, i) \
+    ((float4)(SINGLY_LOAD_2(half, buffer, 2 * (i)), SINGLY_LOAD_2(half, buffer, 2 * (i) + 1)))
+
+// Two by two, which takes fewer shuffles.
+typedef ulong PairOfFloats __attribute__((may_alias));
+static inline float4 LoadInPairs(__global const void* buffer, size_t i) {
+    const ulong low = ((__global const PairOfFloats*)buffer)[2 * i];
+    const ulong high = ((__global const PairOfFloats*)buffer)[2 * i + 1];
+    return (float4)(as_float((uint)low), as_float((uint)(low >> 32)), as_float((uint)high),
+                    as_float((uint)(high >> 32)));
+}
+#define LOAD_SINGLY_4_float(buffer, i) LoadInPairs(buffer, i)
+
+static inline uchar ToByte(float value) {
+    const float positive = value > 0.0f ? value : 0.0f;
+    return (uchar)as_uint(AS_BYTE_DIGITS(positive < 1.0f ? positive : 1.0f));
+}
+
+// Rounded to nearest even, without the branches of the library's function. Halves too small for a whole mantissa have
+// the steps of floats from 0.5 on; what is too large becomes infinite.
+static inline ushort ToHalf(float value) {
+    const uint bits = as_uint(value);
+    const uint magnitude = bits & 0x7fffffffu;
+    const uint bounded = min(magnitude, 0x47800000u);
+    const uint normal = (bounded - 0x37fff001u + (magnitude >> 13 & 1u)) >> 13;
+    const uint small = as_uint(as_float(magnitude) + 0.5f) - 0x3f000000u;
+    const uint nan = magnitude > 0x7f800000u ? 0x200u : 0u;
+    return (ushort)((bits >> 16 & 0x8000u) | (magnitude < 0x38800000u ? small : normal) | nan);
+}
+
+#define STORE_uint(buffer, i, value) ((__global uchar*)(buffer))[i] = ToByte(value)
+#define STORE_half(buffer, i, value) ((__global ushort*)(buffer))[i] = ToHalf(value)
+#define STORE_float(buffer, i, value) ((__global float*)(buffer))[i] = value
+#define SINGLY_STORE_1(type, buffer, i, value) STORE_##type(buffer, i, value)
+#define SINGLY_STORE_2(type, buffer, i, values) \
+    STORE_##type(buffer, 2 * (i), (values).x);  \
+    STORE_##type(buffer, 2 * (i) + 1, (values).y)
+#define SINGLY_STORE_3(type, buffer, i, values)    \
+    STORE_##type(buffer, 3 * (i), (values).x);     \
+    STORE_##type(buffer, 3 * (i) + 1, (values).y); \
+    STORE_##type(buffer, 3 * (i) + 2, (values).z)
+#define SINGLY_STORE_4(type, buffer, i, values)         \
+    SINGLY_STORE_2(type, buffer, 2 * (i), (values).xy); \
+    SINGLY_STORE_2(type, buffer, 2 * (i) + 1, (values).zw)
 #endif
 
 // ---- Reading and writing pixels ------------------------------------------------------------------------------------
@@ -272,36 +280,42 @@ static inline float Gray(float4 rgba) {
     return (rgba.x + rgba.y + rgba.z) * (1.0f / 3.0f);
 }
 
-#define DEFINE_PIXEL_ACCESS(type)                                                                                 \
-    static inline float4 ReadPixel_##type##_1(__global const void* buffer, int2 bufferSize, int x, int y) {       \
-        const float gray = LOAD_1(type, buffer, PixelIndex(bufferSize, x, y));                                    \
-        return (float4)(gray, gray, gray, 1.0f);                                                                  \
-    }                                                                                                             \
-    static inline float4 ReadPixel_##type##_2(__global const void* buffer, int2 bufferSize, int x, int y) {       \
-        const float2 value = LOAD_2(type, buffer, PixelIndex(bufferSize, x, y));                                  \
-        return value.xxxy;                                                                                        \
-    }                                                                                                             \
-    static inline float4 ReadPixel_##type##_3(__global const void* buffer, int2 bufferSize, int x, int y) {       \
-        return (float4)(LOAD_3(type, buffer, PixelIndex(bufferSize, x, y)), 1.0f);                                \
-    }                                                                                                             \
-    static inline float4 ReadPixel_##type##_4(__global const void* buffer, int2 bufferSize, int x, int y) {       \
-        return LOAD_4(type, buffer, PixelIndex(bufferSize, x, y));                                                \
-    }                                                                                                             \
-    static inline void WritePixel_##type##_1(__global void* buffer, int2 bufferSize, int x, int y, float4 rgba) { \
-        STORE_1(type, buffer, PixelIndex(bufferSize, x, y), Gray(rgba));                                          \
-    }                                                                                                             \
-    static inline void WritePixel_##type##_2(__global void* buffer, int2 bufferSize, int x, int y, float4 rgba) { \
-        STORE_2(type, buffer, PixelIndex(bufferSize, x, y), (float2)(Gray(rgba), rgba.w));                        \
-    }                                                                                                             \
-    static inline void WritePixel_##type##_3(__global void* buffer, int2 bufferSize, int x, int y, float4 rgba) { \
-        STORE_3(type, buffer, PixelIndex(bufferSize, x, y), rgba.xyz);                                            \
-    }                                                                                                             \
-    static inline void WritePixel_##type##_4(__global void* buffer, int2 bufferSize, int x, int y, float4 rgba) { \
-        STORE_4(type, buffer, PixelIndex(bufferSize, x, y), rgba);                                                \
+#define DEFINE_PIXEL_ACCESS(how, read, write, type)                                                            \
+    static inline float4 read##_##type##_1(__global const void* buffer, int2 bufferSize, int x, int y) {       \
+        const float gray = how##_LOAD_1(type, buffer, PixelIndex(bufferSize, x, y));                           \
+        return (float4)(gray, gray, gray, 1.0f);                                                               \
+    }                                                                                                          \
+    static inline float4 read##_##type##_2(__global const void* buffer, int2 bufferSize, int x, int y) {       \
+        const float2 value = how##_LOAD_2(type, buffer, PixelIndex(bufferSize, x, y));                         \
+        return value.xxxy;                                                                                     \
+    }                                                                                                          \
+    static inline float4 read##_##type##_3(__global const void* buffer, int2 bufferSize, int x, int y) {       \
+        return (float4)(how##_LOAD_3(type, buffer, PixelIndex(bufferSize, x, y)), 1.0f);                       \
+    }                                                                                                          \
+    static inline float4 read##_##type##_4(__global const void* buffer, int2 bufferSize, int x, int y) {       \
+        return how##_LOAD_4(type, buffer, PixelIndex(bufferSize, x, y));                                       \
+    }                                                                                                          \
+    static inline void write##_##type##_1(__global void* buffer, int2 bufferSize, int x, int y, float4 rgba) { \
+        how##_STORE_1(type, buffer, PixelIndex(bufferSize, x, y), Gray(rgba));                                 \
+    }                                                                                                          \
+    static inline void write##_##type##_2(__global void* buffer, int2 bufferSize, int x, int y, float4 rgba) { \
+        how##_STORE_2(type, buffer, PixelIndex(bufferSize, x, y), (float2)(Gray(rgba), rgba.w));               \
+    }                                                                                                          \
+    static inline void write##_##type##_3(__global void* buffer, int2 bufferSize, int x, int y, float4 rgba) { \
+        how##_STORE_3(type, buffer, PixelIndex(bufferSize, x, y), rgba.xyz);                                   \
+    }                                                                                                          \
+    static inline void write##_##type##_4(__global void* buffer, int2 bufferSize, int x, int y, float4 rgba) { \
+        how##_STORE_4(type, buffer, PixelIndex(bufferSize, x, y), rgba);                                       \
     }
-DEFINE_PIXEL_ACCESS(uint)
-DEFINE_PIXEL_ACCESS(half)
-DEFINE_PIXEL_ACCESS(float)
+#define DEFINE_ALL_PIXEL_ACCESS(how, read, write) \
+    DEFINE_PIXEL_ACCESS(how, read, write, uint)   \
+    DEFINE_PIXEL_ACCESS(how, read, write, half)   \
+    DEFINE_PIXEL_ACCESS(how, read, write, float)
+#if ON_CENTRAL_PROCESSOR && defined(HASH)
+DEFINE_ALL_PIXEL_ACCESS(SINGLY, ReadPixel, WritePixel)
+#else
+DEFINE_ALL_PIXEL_ACCESS(VECTOR, ReadPixel, WritePixel)
+#endif
 
 static inline float4 ReadPixel_none_none(int buffer, int2 bufferSize, int x, int y) {
     return (float4)((float)buffer);
