@@ -489,7 +489,7 @@ static inline float SimpleTone(float value, float exposure, float contrast, bool
     const float exposed = stretched * exp2(Within(-126.0f, exposure, 127.0f));
     const float x = Within(0.0f, exposed, 10000.0f);
     const float curve = Quotient(x * (2.51f * x + 0.03f), (2.43f * x + 0.59f) * x + 0.14f);
-    return curved ? Within(0.0f, curve, 1.0f) : exposed;
+    return curved ? (curve < 1.0f ? curve : 1.0f) : exposed;
 }
 
 // What a pixel's luminance asks its colour to be scaled by.
@@ -512,12 +512,12 @@ static inline float ReinhardScale(float luminance, float key, float white_point,
 // stays black. All logarithms have base 2, which cancels.
 static inline float DragoScale(float luminance, float bias, float average, float maximum) {
     // No logarithm here has a value at -1 or below.
-    const float adapted = Within(-0.99999994f, Quotient(luminance, average), 1e37f);
+    const float adapted = Within(-0.99999994f, luminance * (1.0f / Within(1e-37f, average, 1e37f)), 1e37f);
     const float compression = fabs(adapted) > 1e-30f ? Quotient(Log2Of1Plus(adapted), adapted) : 1.44269504f;
     const float brightest = Within(-0.99999994f, maximum / average, 1e37f);
 
     // (luminance / maximum) ^ (ln bias / ln 0.5), for a negative base only where the exponent is whole.
-    const float portion = Within(-1e37f, Quotient(luminance, maximum), 1e37f);
+    const float portion = Within(-1e37f, luminance * (1.0f / Within(1e-37f, maximum, 1e37f)), 1e37f);
     const float exponent = -Log2_float(bias > 1e-37f ? bias : 1e-37f);
     const float base = fabs(portion) > 1e-37f ? fabs(portion) : 1e-37f;
     const float magnitude = Exp2_float(Within(-120.0f, Log2_float(base) * exponent, 120.0f));
