@@ -120,8 +120,9 @@ static inline int2 LaunchedPixels(int2 size) {
     return (int2)((int)min((size_t)size.x, get_global_size(0)), (int)min((size_t)size.y, get_global_size(1)));
 }
 
-// Before a loop of which compilers make vectors, untested: a picture may be filtered in place, but no pixel reads
-// another one's result. They succeed with plain numbers only: such kernels compute component by component.
+// Before a loop over pixels: compilers may compute them side by side without a test for overlaps. A picture may be
+// filtered in place, but no pixel reads another one's result. Compilers make vectors of plain numbers only, so what such
+// a loop calls computes component by component, without branches.
 #ifdef __clang__
 #define PIXELS_ARE_INDEPENDENT _Pragma("clang loop vectorize(assume_safety) vectorize_width(8)")
 #else
@@ -134,8 +135,8 @@ static inline int2 LaunchedPixels(int2 size) {
         return;                                         \
     }
 
-// That item takes the pixels of all. The groups of some rows have as many items as these rows have pixels, or
-// more, and take them in the order of the rows, in which `place` counts: memory is read as it lies.
+// That item takes the pixels of all. The groups of some rows have as many items as these rows have pixels, or more, and
+// take them in the order of the rows, in which `place` counts: memory is read as it lies.
 #define TAKE_PIXELS_OF_GROUP(coord, limits)                                                          \
     FIRST_OF_GROUP_ONLY                                                                              \
     const int2 launched = LaunchedPixels(limits);                                                    \
