@@ -121,8 +121,8 @@ static inline int2 LaunchedPixels(int2 size) {
 }
 
 // Before a loop over pixels: compilers may compute them side by side without a test for overlaps. A picture may be
-// filtered in place, but no pixel reads another one's result. Compilers make vectors of plain numbers only, so what such
-// a loop calls computes component by component, without branches.
+// filtered in place, but no pixel reads another one's result. Compilers make vectors of plain numbers only, so what
+// such a loop calls computes component by component, without branches.
 #ifdef __clang__
 #define PIXELS_ARE_INDEPENDENT _Pragma("clang loop vectorize(assume_safety) vectorize_width(8)")
 #else
@@ -221,41 +221,61 @@ static inline uchar4 ToBytes(float4 values) {
 #define SINGLY_LOAD_2(type, buffer, i) ((float2)(LOAD_##type(buffer, 2 * (i)), LOAD_##type(buffer, 2 * (i) + 1)))
 #define SINGLY_LOAD_3(type, buffer, i) \
     ((float3)(LOAD_##type(buffer, 3 * (i)), LOAD_##type(buffer, 3 * (i) + 1), LOAD_##type(buffer, 3 * (i) + 2)))
-#define SINGLY_LOAD_4(type, buffer, i) LOAD_SINGLY_4_##type(buffer, i)
-#define LOAD_SINGLY_4_uint(buffer, i) \
-    ((float4)(SINGLY_LOAD_2(uint, buffer, 2 * (i)), SINGLY_LOAD_2(uint, buffer, 2 * (i) + 1)))
-#define LOAD_SINGLY_4_half(buffer, i) \
-    ((float4)(SINGLY_LOAD_2(half, buffer, 2 * (i)), SINGLY_LOAD_2(half, buffer, 2 * (i) + 1)))
 
-// Two by two, which takes fewer shuffles.
-typedef ulong PairOfFloats __attribute__((may_alias));
-static inline float4 LoadInPairs(__global const void* buffer, size_t i) {
-    const ulong low = ((__global const PairOfFloats*)buffer)[2 * i];
-    const ulong high = ((__global const PairOfFloats*)buffer)[2 * i + 1];
+// Four components come in numbers of 32 and 64 bits and are taken apart there, which takes fewer shuffles.
+typedef uint PackedWord __attribute__((may_alias));
+typedef ulong PackedPair __attribute__((may_alias));
+
+static inline float4 LoadFourBytes(__global const void* buffer, size_t i) {
+    const uint word = ((__global const PackedWord*)buffer)[i];
+    return (float4)((float)(int)(word & 0xffu) * (1.0f / 255.0f), (float)(int)(word >> 8 & 0xffu) * (1.0f / 255.0f),
+                    (float)(int)(word >> 16 & 0xffu) * (1.0f / 255.0f), (float)(int)(word >> 24) * (1.0f / 255.0f));
+}
+
+// The bits of a half as a float: normal numbers, infinities and NaN by their exponent, smaller ones from 0.5 on.
+static inline float FromHalf(uint bits) {
+    const uint magnitude = bits & 0x7fffu;
+    const float normal = as_float((magnitude << 13) + (magnitude < 0x7c00u ? 0x38000000u : 0x70000000u));
+    const float small = as_float(magnitude | 0x3f000000u) - 0.5f;
+    return as_float(as_uint(magnitude < 0x400u ? small : normal) | (bits & 0x8000u) << 16);
+}
+
+static inline float4 LoadFourHalves(__global const void* buffer, size_t i) {
+    const uint low = ((__global const PackedWord*)buffer)[2 * i];
+    const uint high = ((__global const PackedWord*)buffer)[2 * i + 1];
+    return (float4)(FromHalf(low & 0xffffu), FromHalf(low >> 16), FromHalf(high & 0xffffu), FromHalf(high >> 16));
+}
+
+static inline float4 LoadFourFloats(__global const void* buffer, size_t i) {
+    const ulong low = ((__global const PackedPair*)buffer)[2 * i];
+    const ulong high = ((__global const PackedPair*)buffer)[2 * i + 1];
     return (float4)(as_float((uint)low), as_float((uint)(low >> 32)), as_float((uint)high),
                     as_float((uint)(high >> 32)));
 }
-#define LOAD_SINGLY_4_float(buffer, i) LoadInPairs(buffer, i)
+#define SINGLY_LOAD_4(type, buffer, i) LOAD_SINGLY_4_##type(buffer, i)
+#define LOAD_SINGLY_4_uint(buffer, i) LoadFourBytes(buffer, i)
+#define LOAD_SINGLY_4_half(buffer, i) LoadFourHalves(buffer, i)
+#define LOAD_SINGLY_4_float(buffer, i) LoadFourFloats(buffer, i)
 
-static inline uchar ToByte(float value) {
+static inline uint ToByte(float value) {
     const float positive = value > 0.0f ? value : 0.0f;
-    return (uchar)as_uint(AS_BYTE_DIGITS(positive < 1.0f ? positive : 1.0f));
+    return as_uint(AS_BYTE_DIGITS(positive < 1.0f ? positive : 1.0f)) & 0xffu;
 }
 
 // Rounded to nearest even, without the branches of the library's function. Halves too small for a whole mantissa have
 // the steps of floats from 0.5 on; what is too large becomes infinite.
-static inline ushort ToHalf(float value) {
+static inline uint ToHalf(float value) {
     const uint bits = as_uint(value);
     const uint magnitude = bits & 0x7fffffffu;
     const uint bounded = min(magnitude, 0x47800000u);
     const uint normal = (bounded - 0x37fff001u + (magnitude >> 13 & 1u)) >> 13;
     const uint small = as_uint(as_float(magnitude) + 0.5f) - 0x3f000000u;
     const uint nan = magnitude > 0x7f800000u ? 0x200u : 0u;
-    return (ushort)((bits >> 16 & 0x8000u) | (magnitude < 0x38800000u ? small : normal) | nan);
+    return (bits >> 16 & 0x8000u) | (magnitude < 0x38800000u ? small : normal) | nan;
 }
 
-#define STORE_uint(buffer, i, value) ((__global uchar*)(buffer))[i] = ToByte(value)
-#define STORE_half(buffer, i, value) ((__global ushort*)(buffer))[i] = ToHalf(value)
+#define STORE_uint(buffer, i, value) ((__global uchar*)(buffer))[i] = (uchar)ToByte(value)
+#define STORE_half(buffer, i, value) ((__global ushort*)(buffer))[i] = (ushort)ToHalf(value)
 #define STORE_float(buffer, i, value) ((__global float*)(buffer))[i] = value
 #define SINGLY_STORE_1(type, buffer, i, value) STORE_##type(buffer, i, value)
 #define SINGLY_STORE_2(type, buffer, i, values) \
@@ -265,9 +285,16 @@ static inline ushort ToHalf(float value) {
     STORE_##type(buffer, 3 * (i), (values).x);     \
     STORE_##type(buffer, 3 * (i) + 1, (values).y); \
     STORE_##type(buffer, 3 * (i) + 2, (values).z)
-#define SINGLY_STORE_4(type, buffer, i, values)         \
-    SINGLY_STORE_2(type, buffer, 2 * (i), (values).xy); \
-    SINGLY_STORE_2(type, buffer, 2 * (i) + 1, (values).zw)
+#define SINGLY_STORE_4(type, buffer, i, values) STORE_SINGLY_4_##type(buffer, i, values)
+#define STORE_SINGLY_4_uint(buffer, i, values) \
+    ((__global PackedWord*)(buffer))[i] =      \
+        ToByte((values).x) | ToByte((values).y) << 8 | ToByte((values).z) << 16 | ToByte((values).w) << 24
+#define STORE_SINGLY_4_half(buffer, i, values)                                                 \
+    ((__global PackedWord*)(buffer))[2 * (i)] = ToHalf((values).x) | ToHalf((values).y) << 16; \
+    ((__global PackedWord*)(buffer))[2 * (i) + 1] = ToHalf((values).z) | ToHalf((values).w) << 16
+#define STORE_SINGLY_4_float(buffer, i, values)          \
+    SINGLY_STORE_2(float, buffer, 2 * (i), (values).xy); \
+    SINGLY_STORE_2(float, buffer, 2 * (i) + 1, (values).zw)
 #endif
 
 // ---- Reading and writing pixels ------------------------------------------------------------------------------------
