@@ -1,5 +1,5 @@
-// Accumulation of successive frames: motion between two cameras, reprojection and blending of the history, and the
-// history's exchange for the next frame. Each kernel is built only with a definition of its own.
+// Accumulation of successive frames: reprojection and blending of the history, and its exchange for the next frame. Each
+// kernel is built only with a definition of its own, as the one of MotionBuffer.cl is, which shares the program.
 //
 // The history is seven slices of four floats per pixel. Everything stored there is finite: NaN, infinite and huge input
 // values are replaced before they are used, positions and normals by zero (which starts a pixel afresh), colours by the
