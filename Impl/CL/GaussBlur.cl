@@ -131,7 +131,6 @@ static inline void SumRun(float16* sums, srcBufferType(srcBuffer), int width, in
 __kernel void GaussBlurHorKernel(srcBufferType(srcBuffer), dst_float_4 dstBuffer) {
     const int2 size = GET_BUFFER_SIZE(dstBuffer);
     const uint count = (uint)size.x * (uint)size.y;
-    FIRST_OF_GROUP_ONLY
     uint place = (uint)get_global_id(0);
     if (place % BLOCK_SIZE != 0 || place >= count) {
         return;
@@ -198,7 +197,6 @@ static inline void SumRows(float16* sums, __global const float4* srcBuffer, int2
 __kernel void GaussBlurVertKernel(src_float_4 srcBuffer, dstBufferType(dstBuffer)) {
     const int2 size = GET_BUFFER_SIZE(dstBuffer);
     const uint count = (uint)size.x * (uint)size.y;
-    FIRST_OF_GROUP_ONLY
     const uint block = (uint)get_global_id(0) / BLOCK_SIZE;
     if ((uint)get_global_id(0) % BLOCK_SIZE != 0 || block * BLOCK_SIZE >= count) {
         return;

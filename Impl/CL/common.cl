@@ -1,4 +1,5 @@
-// Pixel access shared by every kernel, and a few small functions of general use.
+// Pixel access shared by every kernel, and all that kernels call which can be fused: a fused program has no other text
+// to include.
 //
 // Three definitions describe each image argument N: N_COMP_TYPE (uint, half, float, sampler or none), N_COMP_NUM (1 to
 // 4, empty with sampler, none with none) and N_Res, its (int2) size. The macros below paste them together where they
